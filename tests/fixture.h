@@ -1,0 +1,72 @@
+// What the tests share: files, the captured log, counted waits, a scripted surrogate parent.
+// Every test process runs in namespaces of its own with the stand-in unit's files and interfaces.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace test {
+
+std::string read_file(const std::string &path);
+void write_file(const std::string &path, const std::string &content);
+// The names in a directory, sorted, one per line.
+std::string list_directory(const std::string &path);
+// Permission bits of a path (not following a link).
+unsigned mode_of(const std::string &path);
+std::string link_target(const std::string &path);
+int open_descriptors();
+// Runs a shell command; fails the test when it does not exit with 0.
+void run(const std::string &command);
+
+// Makes exactly these interfaces present besides lo, all with carrier (removes the others).
+void set_interfaces(const std::vector<std::string> &names);
+
+// What was sent to /dev/log since the last call: one line per message, "<priority> <text>\n",
+// without time, identity, process and thread id: "6 hostname: vl\n". A line feed inside a text
+// stays.
+std::string take_log();
+// The datagrams as they came.
+std::vector<std::string> take_raw_log();
+
+// sleep and nanosleep are counted, not sat through: one entry per call, in nanoseconds.
+std::vector<int64_t> take_waits();
+// What the n-th call from now (1 is the next) of nanosleep returns: -1 with this errno.
+void fail_nanosleep(int nth, int error);
+
+// A surrogate parent on 127.0.0.1:12865 that plays a script, on a thread of its own: it takes one
+// connection after the other; for each it waits for the request (up to its line feed-ended last
+// line), sends `reply`, then does what `then` says. `received()` is all that came over all
+// connections so far.
+class ScriptedSurrogate {
+  public:
+    enum class Then {
+        close,        // close the connection
+        hold,         // keep it open until the client closes
+        await_start,  // wait for "start\n", send `output`, close
+        await_kill,   // wait for "start\n", send `output`, then wait for "kill\n" or the client's
+                      // close
+        close_at_once // close without reading or sending anything
+    };
+    ScriptedSurrogate(std::string reply, Then then, std::string output = "");
+    ScriptedSurrogate(const ScriptedSurrogate &) = delete;
+    ScriptedSurrogate &operator=(const ScriptedSurrogate &) = delete;
+    ~ScriptedSurrogate();
+    std::string received();
+
+  private:
+    struct State;
+    State *state_;
+};
+
+// The unit's own files, after `unit::make_unit_files`, with the library started under the root path
+// and the log emptied. Tests that need a root path of their own set VL_ROOT before vlsys_init.
+class Unit : public ::testing::Test {
+  protected:
+    void SetUp() override;
+    void TearDown() override; // vlsys_exit; the test fails when descriptors are left open
+};
+
+} // namespace test

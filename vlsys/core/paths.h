@@ -1,0 +1,31 @@
+// Every fixed system path, and the way to build one under the root path.
+#pragma once
+
+#include "vlsys.h"
+
+namespace vlsys {
+
+// Under the root path.
+inline constexpr char localtime_path[] = "/etc/localtime";   // link to the zone file
+inline constexpr char clock_path[] = "/etc/sysconfig/clock"; // ZONE
+inline constexpr char network_path[] =
+    "/etc/sysconfig/network"; // HOSTNAME, GATEWAY, IPV6_DEFAULTGW
+inline constexpr char ifcfg_prefix[] = "/etc/sysconfig/network-scripts/ifcfg-"; // + interface name
+inline constexpr char sysctl_path[] = "/etc/sysctl.d/velmora"; // IPv6 kernel switches
+
+// Of the running system, whatever the root path is.
+inline constexpr char zoneinfo_prefix[] = "/usr/share/zoneinfo/"; // + zone name
+inline constexpr char resolv_path[] = "/etc/resolv.conf";
+inline constexpr char ipv6_conf_path[] = "/proc/sys/net/ipv6/conf";
+inline constexpr char avio_status_path[] = "/proc/driver/VlAvio/status";
+inline constexpr char version_path[] = "/etc/velmora-version";
+inline constexpr char block_path[] = "/sys/block";
+
+// A path under the root path, cut to 4095 bytes.
+struct SystemPath {
+    explicit SystemPath(const char *fixed, const char *name = "");
+
+    char text[VLSYS_PATH_SIZE];
+};
+
+} // namespace vlsys
