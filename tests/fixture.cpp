@@ -313,8 +313,6 @@ int main(int argc, char **argv) {
     testing::InitGoogleTest(&argc, argv);
     if (!only_listing) {
         unit::enter_namespaces();
-        for (const char *directory : {"/etc", "/usr/bin", "/dev"})
-            unit::mirror(directory);
         test::start_log();
     }
     return RUN_ALL_TESTS();

@@ -1,5 +1,6 @@
 // What the tests share: files, the captured log, counted waits, a scripted surrogate parent.
-// Every test process runs in namespaces of its own with the stand-in unit's files and interfaces.
+// Every test process runs in namespaces of its own with the stand-in unit's files and interfaces;
+// /run is the place for files of a test's own (see unit/sandbox.h for what else can be written).
 #pragma once
 
 #include <gtest/gtest.h>
@@ -61,8 +62,8 @@ class ScriptedSurrogate {
     State *state_;
 };
 
-// The unit's own files, after `unit::make_unit_files`, with the library started under the root path
-// and the log emptied. Tests that need a root path of their own set VL_ROOT before vlsys_init.
+// The files of the "sy" unit in place, its interfaces not (see set_interfaces), the library started
+// and the log emptied.
 class Unit : public ::testing::Test {
   protected:
     void SetUp() override;
