@@ -3,7 +3,7 @@
 
 #include <cstring>
 
-// What the technician reports when a run fails; the numbers stand in the service manual.
+// The numbers are fixed: technicians know each failure by its own.
 static int failed(const char *function, int number) {
     printf("ERROR: factory.cpp %s %d\n", function, number);
     return -1;

@@ -14,9 +14,10 @@
 static const char *const levels[] = {"emerg",   "alert",  "crit", "error",
                                      "warning", "notice", "info", "debug"};
 
-// "<131>Nov 24 10:00:00 ident[pid]: text"
+// "<131>Nov 24 10:00:00 ident[process id]: [thread id]: text"
 static void print_message(const std::string &datagram) {
-    const size_t text = datagram.find("]: ");
+    const size_t thread = datagram.find("]: [");
+    const size_t text = thread == std::string::npos ? thread : datagram.find("]: ", thread + 4);
     printf("%-8s%s\n", levels[LOG_PRI(atoi(datagram.c_str() + 1))],
            datagram.c_str() + (text == std::string::npos ? 0 : text + 3));
     fflush(stdout);

@@ -4,6 +4,7 @@
 #include "unit/sandbox.h"
 
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <unistd.h>
 
@@ -15,11 +16,12 @@ static int list_kinds() {
 
 static void make_unit(const unit::Kind &kind) {
     unit::enter_namespaces();
+    setenv("PATH", (std::string(UNIT_PROGRAMS ":") + getenv("PATH")).c_str(), 1);
     unit::make_unit_files(kind.name);
     for (const char *interface : {"eth0", "eth1", "eth2", "eth10", "virbr0"})
         unit::add_interface(interface);
     if (kind.surrogate)
-        unit::run(SURROGATE_PROGRAM);
+        unit::run("surrogate-parent");
 }
 
 int main(int argc, char **argv) {

@@ -28,6 +28,7 @@ static void log_to_stdout(int priority, const char *format, va_list arguments) {
 
 VLSYS_PRINTF(2, 0)
 static void log_to_system(int priority, const char *format, va_list arguments) {
+    const SavedErrno caller;
     va_list again;
     va_copy(again, arguments);
     char *message = nullptr;
@@ -35,6 +36,7 @@ static void log_to_system(int priority, const char *format, va_list arguments) {
         const Text owner(message);
         syslog(priority, "[%d]: %s", gettid(), message);
     } else {
+        errno = caller.value(); // for "%m"
         vsyslog(priority, format, again);
     }
     va_end(again);

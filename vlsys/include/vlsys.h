@@ -13,8 +13,8 @@
  * says below what else it logs, and where it fails silently.
  *
  * System files are replaced whole: a reader sees the old file or the new one, mode 0644. Files
- * under
- * "<root>" are found under the root path (VL_ROOT), all others at the path given.
+ * named below as "<root>/..." are found under the root path (VL_ROOT), all others at the path
+ * given.
  */
 #ifndef VLSYS_H
 #define VLSYS_H
@@ -55,23 +55,78 @@ extern "C" {
 
 /* ---- Start-up and paths ---------------------------------------------------------------------- */
 
+/*
+ * Starts the library: takes the paths from the environment variables VL_ROOT (default ""),
+ * VL_PREFIX
+ * ("/usr") and VL_DATA ("/velmora"). A variable that is set but empty counts as set; the texts are
+ * joined as they are, no separator is added. On a started library it changes nothing.
+ *
+ * Returns 0, or the negated errno when a path could not be allocated; the library is then not
+ * started.
+ * Logs version and build date at LOG_INFO; on a started library "initialized 1 times" at LOG_DEBUG.
+ */
 VLSYS_API int vlsys_init(void);
+
+/* Stops the library: the next vlsys_init reads the environment again. Logs nothing. */
 VLSYS_API void vlsys_exit(void);
+
+/*
+ * The root of the system tree; the root followed by the prefix; the root followed by the data path.
+ * Copies the path into the buffer of `size` bytes, cut to size - 1 bytes and NUL-terminated.
+ *
+ * Returns the length of the whole path, also when it was cut or the buffer is null (nothing is
+ * written); 0 when the size is 0 (nothing is written); -200 when the library is not started. Logs
+ * nothing.
+ */
 VLSYS_API int64_t vlsys_get_path_root(char *buffer, size_t size);
 VLSYS_API int64_t vlsys_get_path_prefix(char *buffer, size_t size);
 VLSYS_API int64_t vlsys_get_path_data(char *buffer, size_t size);
 
 /* ---- Bounded text ---------------------------------------------------------------------------- */
 
+/*
+ * Copies the source, cut to size - 1 bytes, and terminates it; writes nothing when the size is 0.
+ * Returns the length of the source: the copy was cut when that is `size` or more.
+ */
 VLSYS_API size_t vlsys_strlcpy(char *destination, const char *source, size_t size);
+
+/*
+ * Appends the source to the text in a destination of `size` bytes, cut to the room left, and
+ * terminates it. Writes nothing when the destination has no NUL within `size` bytes.
+ * Returns the length of the text it tried to make, where an unterminated destination counts as
+ * `size` bytes long: the text was cut when that is `size` or more.
+ */
 VLSYS_API size_t vlsys_strlcat(char *destination, const char *source, size_t size);
 
 /* ---- Log ------------------------------------------------------------------------------------- */
 
+/*
+ * Logs a message at a priority of <syslog.h> (LOG_EMERG to LOG_DEBUG); "%m" in the format is the
+ * text of errno. errno is left as it was; a null format is ignored.
+ *
+ * The message goes to the system log as "[<thread id>]: <message>"; the first one opens it with the
+ * program's short name, LOG_PID and LOG_LOCAL0 unless vlsys_openlog came before. In
+ * standard-output mode it goes there, after the prefix "<ident>[<process id>]: <<level>>: [<thread
+ * id>]: " (none at LOG_DEBUG), and a line feed follows unless the format itself ends in one.
+ */
 VLSYS_API void vlsys_log(int priority, const char *format, ...) VLSYS_PRINTF(2, 3);
 VLSYS_API void vlsys_vlog(int priority, const char *format, va_list arguments) VLSYS_PRINTF(2, 0);
+
+/*
+ * Opens the log under an identity text, which is not copied and must outlive it. The option and
+ * facility are those of openlog; a negative facility selects standard-output mode instead, for the
+ * rest of the process's life.
+ */
 VLSYS_API void vlsys_openlog(const char *ident, int option, int facility);
+
+/* Closes the system log; in standard-output mode does nothing. Logging again opens it again. */
 VLSYS_API void vlsys_closelog(void);
+
+/*
+ * Sets which priorities are logged: bit p (LOG_MASK(p)) lets priority p through. A mask of 0 leaves
+ * the system log's mask as it is, and silences standard-output mode.
+ * Returns the mask that was in force in the present mode (0xFF at first).
+ */
 VLSYS_API int vlsys_setlogmask(int mask);
 
 /* ---- Time zone ------------------------------------------------------------------------------- */
