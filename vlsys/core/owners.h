@@ -10,6 +10,20 @@
 
 namespace vlsys {
 
+// Puts errno back to what it was when the guard was made.
+class SavedErrno {
+  public:
+    SavedErrno() : value_(errno) {}
+    SavedErrno(const SavedErrno &) = delete;
+    SavedErrno &operator=(const SavedErrno &) = delete;
+    ~SavedErrno() { errno = value_; }
+
+    int value() const { return value_; }
+
+  private:
+    int value_;
+};
+
 struct Free {
     void operator()(void *memory) const { free(memory); }
 };
@@ -19,8 +33,12 @@ template <class T>
 using Owned = std::unique_ptr<T, Free>;
 using Text = Owned<char>;
 
+// Closing keeps errno: an owner closes on the way out, when errno says why.
 struct CloseFile {
-    void operator()(FILE *file) const { fclose(file); }
+    void operator()(FILE *file) const {
+        const SavedErrno reason;
+        fclose(file);
+    }
 };
 using File = std::unique_ptr<FILE, CloseFile>;
 
@@ -41,6 +59,7 @@ class Fd {
     }
 
     void reset(int fd = -1) {
+        const SavedErrno reason;
         if (fd_ >= 0)
             close(fd_);
         fd_ = fd;
@@ -48,20 +67,6 @@ class Fd {
 
   private:
     int fd_;
-};
-
-// Puts errno back to what it was when the guard was made.
-class SavedErrno {
-  public:
-    SavedErrno() : value_(errno) {}
-    SavedErrno(const SavedErrno &) = delete;
-    SavedErrno &operator=(const SavedErrno &) = delete;
-    ~SavedErrno() { errno = value_; }
-
-    int value() const { return value_; }
-
-  private:
-    int value_;
 };
 
 // Sets the process umask and puts the old one back.
