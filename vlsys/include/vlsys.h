@@ -131,8 +131,46 @@ VLSYS_API int vlsys_setlogmask(int mask);
 
 /* ---- Time zone ------------------------------------------------------------------------------- */
 
+/*
+ * Sets the time zone of the system, then of the calling process. The zone is a path below
+ * /usr/share/zoneinfo/, such as "Asia/Shanghai".
+ *
+ * In this order: checks that the zone file is a compiled one; makes <root>/etc/localtime a symbolic
+ * link to it, by way of "localtime.new" beside it; rewrites <root>/etc/sysconfig/clock, which must
+ * exist, by way of a temporary beside it: every line with "ZONE=" anywhere in it becomes
+ * ZONE="<zone>", and without one the line is appended; sets TZ, overwriting it, and calls tzset.
+ * The clock file is read in pieces of at most 79 bytes: a longer line counts as several, and a line
+ * put in the place of one is cut to 79 bytes. A zone that begins with a double quote is written
+ * without further quotes.
+ *
+ * The first failure ends it; what was done before stays done. Returns
+ * 0        also when the clock file's mode could not be set to 0644 (logged) or TZ could not be set
+ *          (not logged);
+ * -EFAULT  null zone (not logged);
+ * -ENOENT  empty zone (not logged), no such zone file, zone file that does not begin with "TZif",
+ *          no clock file;
+ * -EIO     zone file of fewer than 4 bytes;
+ * else the negated errno of the step that failed.
+ * After a failure in the zone file or the link /etc/localtime is what it was; after one in the
+ * clock file the link is the new one, the clock file is what it was, and TZ is not set. Two calls
+ * at once on one system tree interfere.
+ */
 VLSYS_API int vlsys_set_timezone(const char *zone);
+
+/*
+ * The zone name of <root>/etc/sysconfig/clock: what stands between the ZONE=" and the last double
+ * quote of the first line that has a ZONE=" (to the end of the line, line feed included, when no
+ * other quote follows). An unquoted zone is not found. Lines over 79 bytes count as several.
+ *
+ * Copies it into the buffer of `size` bytes as vlsys_strlcpy does. Returns its whole length; 0, and
+ * the buffer unchanged, when the buffer is null, the file cannot be opened or has no zone.
+ */
 VLSYS_API size_t vlsys_get_timezone(char *buffer, size_t size);
+
+/*
+ * The present offset of local time from UTC, such as "+0800", in a buffer of 6 bytes or more.
+ * Returns its length, 5; 0 when the buffer is null or too small (its content is then unspecified).
+ */
 VLSYS_API size_t vlsys_get_utc_offset(char *buffer, size_t size);
 
 /* ---- Network records ------------------------------------------------------------------------- */
@@ -215,13 +253,95 @@ VLSYS_API int vlsys_set_hostname_immediately(const char *name);
 
 /* ---- Processes ------------------------------------------------------------------------------- */
 
+/*
+ * Starts "/bin/sh -c <command>" as a child of the caller and returns its process id at once. The
+ * caller reaps the child; one that could not execute the shell exits with 127. The child has the
+ * caller's dispositions of SIGINT and SIGQUIT and its signal mask. In the parent the two signals
+ * are ignored and SIGCHLD is blocked while the child is made, and put back before the return.
+ * Standard output is flushed first.
+ *
+ * Returns -1, with errno set and nothing changed, when a signal could not be set or the child not
+ * made. Logs the command (in the child) and the process id at LOG_DEBUG. Not for two threads at
+ * once.
+ */
 VLSYS_API pid_t vlsys_spawn_direct(const char *command);
+
+/*
+ * Describes a wait status (that of waitpid, system, vlsys_system) in one line, cut to size - 1
+ * bytes and NUL-terminated:
+ *   exited (<name>), status: <exit code>
+ *   exited (<name>), abnormally, signaled: <signal>
+ *   exited (<name>), abnormally                        (stopped, not ended)
+ * with " pid: <pid>" after the first word when the process id is not 0. A null name shows as "?".
+ *
+ * Returns the exit code (0 to 255) of a normal exit, 256 for any other status. Logs nothing.
+ */
 VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const char *name,
                                      int status);
+
+/*
+ * The surrogate parent is a local service that runs shell commands for others: it takes the
+ * caller's working directory and the command, and answers with a number. The three operations below
+ * open one connection each, to TCP port 12865 of 127.0.0.1, and share these rules:
+ * - A command is one line: what follows a line feed in it would not reach the shell.
+ * - When the connection cannot be made (the reason is logged at LOG_ERR, the fallback at
+ *   LOG_WARNING) the command is run directly, as each operation says. After it was made there is no
+ *   fallback: the operation fails, and errno says why.
+ * - A request that could only be sent in part is not run.
+ * - They log the working directory at LOG_DEBUG and the command at LOG_INFO (vlsys_popen: the whole
+ *   request at LOG_DEBUG). A reply that is missing or is no number is not logged.
+ * - They block until the answer comes; no time limit. No signal is raised when the surrogate parent
+ *   goes away, and the connection is closed in programs that the process executes.
+ */
+#define VLSYS_SURROGATE_PORT "12865"
+
+/*
+ * Connects to a TCP service of 127.0.0.1, given as a decimal port number.
+ *
+ * Returns the connected socket, close-on-exec, which the caller closes; -1 on failure; with `quiet`
+ * not 0, 0 when the connection was refused, which is then not logged (descriptor 0 must be open, or
+ * a socket could get that number).
+ */
 VLSYS_API int vlsys_surrogate_connect(int quiet, const char *service);
+
+/*
+ * Runs a shell command and waits for its end. Directly: system().
+ *
+ * Returns the command's wait status (exit code in bits 8 to 15, see vlsys_exit_status_text),
+ * clamped to the range of int, or -1 with errno set: ECONNRESET when the surrogate parent closed
+ * the connection without an answer, EPROTO when its answer is not a number followed by a line feed
+ * or the end (and when the status itself is negative), else that of the call that failed (logged).
+ * Logs the exit code at LOG_DEBUG.
+ */
 VLSYS_API int vlsys_system(const char *command);
+
+/*
+ * Starts a shell command in the background. Directly: vlsys_spawn_direct.
+ *
+ * Returns its process id, or -1 with errno set as for vlsys_system. The command is a child of the
+ * surrogate parent, and of the caller only when it was started directly. Logs the answer and the
+ * process id at LOG_DEBUG.
+ */
 VLSYS_API int vlsys_spawn(const char *command);
+
+/*
+ * Runs a shell command and gives a stream to read its output from. Directly: popen(command, "re").
+ * From the surrogate parent, the last line of the stream is the command's wait status in decimal.
+ * Close it with vlsys_pclose. The stream's descriptor is close-on-exec.
+ *
+ * Returns null with errno set on failure. Working directory and command together may have up to
+ * 1019 bytes, else errno is E2BIG, or ERANGE when the directory alone has over 1023; nothing is run
+ * then. Logs the command's process id at LOG_INFO.
+ */
 VLSYS_API FILE *vlsys_popen(const char *command);
+
+/*
+ * Closes a stream of vlsys_popen. A command that the surrogate parent is still running is ended;
+ * this takes 1 second in any case. One that was run directly is waited for.
+ *
+ * Returns 0, also when the command could not be told to end (logged); the wait status that pclose
+ * gives when the command was run directly; -1 for a null stream.
+ */
 VLSYS_API int vlsys_pclose(FILE *stream);
 
 /* ---- Video I/O driver ------------------------------------------------------------------------ */
