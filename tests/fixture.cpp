@@ -190,17 +190,17 @@ struct ScriptedSurrogate::State {
     bool busy;
     std::string received;
 
-    // Reads until what came since `from` ends in a line feed and holds `lines` of them, or the end.
+    // Reads until `lines` line feeds came, or the end.
     bool await(int connection, long lines) {
         char bytes[4096];
-        for (std::string seen; std::count(seen.begin(), seen.end(), '\n') < lines;) {
+        while (lines > 0) {
             struct pollfd waiting[] = {{connection, POLLIN, 0}, {stop, POLLIN, 0}};
             poll(waiting, 2, -1);
             const ssize_t length =
                 waiting[1].revents ? 0 : recv(connection, bytes, sizeof bytes, 0);
             if (length <= 0)
                 return false;
-            seen.append(bytes, static_cast<size_t>(length));
+            lines -= std::count(bytes, bytes + length, '\n');
             const std::lock_guard lock(mutex);
             received.append(bytes, static_cast<size_t>(length));
         }
