@@ -346,25 +346,183 @@ VLSYS_API int vlsys_pclose(FILE *stream);
 
 /* ---- Video I/O driver ------------------------------------------------------------------------ */
 
+/*
+ * The unit has four video I/O boards. Their driver publishes the registers in the text file
+ * /proc/driver/VlAvio/status, which these operations read into one table of the library; the
+ * product information below is taken from that table. A register that the file does not give keeps
+ * its value in the table, and each is 0 until it was read. Register lines under the header of a
+ * board with another device id are skipped.
+ */
+
+/* Device ids of the boards. */
+#define VLSYS_AVIO_KRD31 0x4160
+#define VLSYS_AVIO_TBX204 0x4161
+#define VLSYS_AVIO_TBX205 0x4162
+#define VLSYS_AVIO_TBX206 0x4163
+
+/*
+ * Result of vlsys_avio_scan_alive: bits 0 to 3 are set for each board found in the file, bits 4 to
+ * 7 for each board found alive, both in the order of the device ids, besides the bits here. The
+ * result is exactly VLSYS_AVIO_READY when all boards are alive and nothing is amiss.
+ */
+#define VLSYS_AVIO_READY 0xff
+#define VLSYS_AVIO_UNKNOWN_DEVICE 0x100 /* a board with another device id was seen */
+#define VLSYS_AVIO_STRAY_ALIVE 0x200    /* an Alive register stands before any board */
+#define VLSYS_AVIO_NO_DRIVER 0x400      /* the status file could not be opened */
+
+/*
+ * Reads the Config register of every board. A value of more than 32 bits, or below 0, is taken as
+ * 0xffffffff.
+ *
+ * Returns 0, or -1 when the file could not be opened, a board with another device id was seen
+ * (logged at LOG_ERR as "unknown device id: ..."), or a register stands before any board; what
+ * could be assigned is in the table even then.
+ */
 VLSYS_API int vlsys_avio_read_config(void);
+
+/*
+ * The Config register of the board with a device id of VLSYS_AVIO_*: 0 after a normal boot, 1 after
+ * a boot from the backup image, other values are illegal. Reads the registers first unless the last
+ * read succeeded.
+ *
+ * Returns the register's 32 bits, or -1 for another device id and when the registers cannot be
+ * read; an illegal register of 0xffffffff reads as -1 too. Logs only what vlsys_avio_read_config
+ * logs.
+ */
 VLSYS_API int vlsys_avio_get_config(unsigned int device_id);
+
+/*
+ * Reads the Alive register of every board. A value is taken only when it is odd (the board is
+ * alive) and below 0x100; others are ignored.
+ *
+ * Returns the bits described above. Logs the values of KRD-31 and TBX-204 at LOG_DEBUG, a board
+ * with another device id at LOG_ERR.
+ */
 VLSYS_API int vlsys_avio_scan_alive(void);
+
+/*
+ * Waits until all boards are alive: up to 960 scans, about 30 ms apart, which is a little under 29
+ * seconds. A missing status file and an interrupted sleep end the wait at once. Then reads the
+ * Config registers and reports.
+ *
+ * Returns 1 when the boards came up, or there is no status file, and none booted from its backup
+ * image; else 0.
+ * Logs the beginning and the end of the wait at LOG_INFO ("can't get VlAvio status. Emulator ?" at
+ * LOG_WARNING without a status file), and each Config register at LOG_INFO, with a LOG_WARNING for
+ * a boot from backup or an illegal value. With the boards up, or without a status file, frame
+ * frequency, destination and HDCP capability follow at LOG_INFO; else "timeout (<seconds>). " at
+ * LOG_ERR, and the boards not found and those not alive at LOG_INFO.
+ */
 VLSYS_API int vlsys_avio_wait_ready(void);
 
 /* ---- Product information --------------------------------------------------------------------- */
 
+/*
+ * The unit's destination code, "SY" or "CN", cut to a buffer of `size` bytes (3 hold it all). As
+ * long as the status of the KRD-31 board has not been read, the first step is
+ * vlsys_avio_wait_ready, with its time and messages; without the driver that is so at every call.
+ *
+ * Returns the length of the whole code, 2.
+ * Logs the code at LOG_INFO; at LOG_WARNING that the status is read now, and that an unknown
+ * destination is taken as "SY".
+ */
 VLSYS_API int vlsys_get_destination(char *buffer, size_t size);
+
+/*
+ * The unit's frame rate. Calls vlsys_get_destination first, with its time and messages.
+ *
+ * Returns 50 or 59 (for 59.94). An unknown rate is taken from the destination, 50 for "CN" and 59
+ * for "SY", with a LOG_WARNING. Logs the rate at LOG_INFO.
+ */
 VLSYS_API int vlsys_get_fps(void);
+
+/*
+ * Whether the unit can handle HDCP. As long as the status of the TBX-205 board has not been read,
+ * waits like vlsys_get_destination, with the same LOG_WARNING; logs nothing else.
+ *
+ * Returns 1 or 0.
+ */
 VLSYS_API int vlsys_get_hdcp_capability(void);
+
+/*
+ * The unit's main serial number, cut to a buffer of `size` bytes; "00000" when the unit names none.
+ * Runs "/usr/bin/Tovrin version -d krd" with vlsys_popen, waits for it without a limit, and closes
+ * it with vlsys_pclose, which takes 1 second more when the surrogate parent ran it.
+ *
+ * The last line of the output is taken as the command's wait status, which the surrogate parent
+ * sends; a text that does not begin with a number counts as 0.
+ *
+ * Returns
+ *   the length of the whole serial number (the text was cut when that is `size` or more);
+ *   0 when the output has no serial number: the buffer is then left as it was;
+ *   the negated errno when the command could not be started;
+ *   -200 minus the wait status when the command was ended by a signal;
+ *   -200 minus the exit code when that is not 0;
+ *   -301 minus the result of vlsys_pclose when that is not 0 (only when the command ran without the
+ *   surrogate parent; -300 when pclose failed).
+ * After a failure the buffer may hold a serial number that was read before it.
+ * Logs each line of the output at LOG_DEBUG.
+ */
 VLSYS_API int vlsys_get_serial_number(char *buffer, size_t size);
+
+/*
+ * The installed software version: the first line of /etc/velmora-version (its first 1023 bytes),
+ * cut to a buffer of `size` bytes, and the file's modification time, stored through `time` (not
+ * null). A version that cannot be read is given as "1.00_SQA3", a time that is not known as
+ * 2013-02-25 07:54:00 UTC.
+ */
 VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 
 /* ---- Files and directories ------------------------------------------------------------------- */
 
+/*
+ * Rebuilds the font cache: runs "fc-cache" with vlsys_system and waits for it without a limit.
+ *
+ * Returns the command's exit code (0 is success), its whole wait status when it was ended by a
+ * signal, or a negative value when it could not be run: the negated errno, if there is one. Logs
+ * only what vlsys_system logs.
+ */
 VLSYS_API int vlsys_fc_cache(void);
+
+/*
+ * Makes a directory and every missing directory above it, each with the mode given (permission
+ * bits, less the umask). The path must not be null; of a longer one the first 4096 bytes are taken.
+ *
+ * Returns 0 when every level was made or was there already, -1 on failure (errno says why); levels
+ * made before the failure stay. An entry of another kind in the directory's place counts as being
+ * there.
+ */
 VLSYS_API int vlsys_mkdir(const char *path, unsigned int mode);
+
+/*
+ * Removes a file, or a directory with all that is in it. Symbolic links are removed, not followed;
+ * other file systems mounted below are not entered. The working directory changes during the call.
+ *
+ * Returns 0, or a positive errno: EFAULT for a null path and ENOENT for an empty one (neither is
+ * logged), else that of the first removal that failed, which ends the work: what was not yet
+ * removed stays.
+ * An entry that the walk cannot enter is logged at LOG_ERR (a directory cycle at LOG_WARNING) and
+ * passed over.
+ */
 VLSYS_API int vlsys_remove_tree(const char *path);
+
+/*
+ * The absolute path of an existing file without symbolic links, "." and "..", cut to a buffer of
+ * `size` bytes; the buffer may be null.
+ *
+ * Returns the length of the whole path, -EFAULT for a null path (not logged), or the negated errno.
+ */
 VLSYS_API int64_t vlsys_realpath(char *buffer, const char *path, size_t size);
+
+/*
+ * The size in bytes of the disk or partition that a device path names after its symbolic links are
+ * resolved; INT64_MAX when it is larger. It is read from the name's size file:
+ * /sys/block/sda/sda1/size for a partition of a disk with a one-letter name ("sda1", "hdb2"),
+ * /sys/block/<name>/size for every other name.
+ *
+ * Returns the size (0 when the file is empty or holds no number), -EFAULT for a null path (not
+ * logged), or the negated errno. Logs the device's name at LOG_DEBUG and the size at LOG_INFO.
+ */
 VLSYS_API int64_t vlsys_get_block_device_size(const char *path);
 
 #ifdef __cplusplus
