@@ -1,0 +1,70 @@
+#include "fileutil/block_device.h"
+
+#include "core/lines.h"
+#include "core/log.h"
+#include "core/owners.h"
+#include "core/paths.h"
+
+#include <cinttypes>
+#include <cstring>
+
+namespace vlsys {
+
+int64_t read_block_size(FILE *file) {
+    constexpr int64_t sector_size = 512;
+    constexpr int64_t sector_limit = INT64_MAX / sector_size;
+    char line[64];
+    if (!read_line(file, line, sizeof line))
+        return 0;
+    const unsigned long long sectors = strtoull(line, nullptr, 10);
+    return sectors < sector_limit ? static_cast<int64_t>(sectors) * sector_size : INT64_MAX;
+}
+
+int64_t read_block_size_file(const char *path) {
+    File file(fopen(path, "re"));
+    if (!file) {
+        vlsys_log(LOG_ERR, "fopen(%s): %m", path);
+        return -errno;
+    }
+    const int64_t size = read_block_size(file.get());
+    file.reset();
+    vlsys_log(LOG_INFO, "%s: %" PRId64, path, size);
+    return size;
+}
+
+// "sda1" and "hdb2": a partition of a disk with a one-letter name.
+static bool is_partition(const char *name) {
+    return strlen(name) > 3 && (name[0] == 'h' || name[0] == 's') && name[1] == 'd' &&
+           name[3] >= '0' && name[3] <= '9';
+}
+
+} // namespace vlsys
+
+using namespace vlsys;
+
+int64_t vlsys_get_block_device_size(const char *path) {
+    if (!path)
+        return -EFAULT;
+    char resolved[VLSYS_PATH_SIZE] = "";
+    const int64_t length = vlsys_realpath(resolved, path, sizeof resolved);
+    if (length == 0)
+        return -ENOENT;
+    if (length < 0)
+        return length;
+
+    const char *const slash = strrchr(resolved, '/');
+    const char *const base = slash ? slash + 1 : resolved;
+    const Text name(strndup(base, VLSYS_PATH_SIZE));
+    if (!name) {
+        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", base, VLSYS_PATH_SIZE);
+        return -errno;
+    }
+    vlsys_log(LOG_DEBUG, "dev: %s", name.get());
+
+    char file[VLSYS_PATH_SIZE + sizeof block_path + sizeof "/sda//size"];
+    if (is_partition(name.get()))
+        snprintf(file, sizeof file, "%s/%.3s/%s/size", block_path, name.get(), name.get());
+    else
+        snprintf(file, sizeof file, "%s/%s/size", block_path, name.get());
+    return read_block_size_file(file);
+}

@@ -1,0 +1,116 @@
+#include "core/log.h"
+#include "core/owners.h"
+
+#include <cstring>
+#include <fts.h>
+
+namespace vlsys {
+
+static int make_level(const char *path, unsigned int mode) {
+    if (mkdir(path, mode) == 0 || errno == EEXIST)
+        return 0;
+    vlsys_log(LOG_ERR, "mkdir(%s, %04o): %m", path, mode);
+    return -1;
+}
+
+struct CloseWalk {
+    const char *path;
+
+    void operator()(FTS *walk) const {
+        if (fts_close(walk) != 0)
+            vlsys_log(LOG_ERR, "fts_close: %s: %m", path);
+    }
+};
+using Walk = std::unique_ptr<FTS, CloseWalk>;
+
+// The walk changes the working directory: calls take fts_accpath, messages fts_path.
+static int remove_file(const FTSENT *entry) {
+    if (unlink(entry->fts_accpath) == 0)
+        return 0;
+    vlsys_log(LOG_ERR, "unlink %s: %m", entry->fts_path);
+    return errno;
+}
+
+static int remove_directory(const FTSENT *entry) {
+    if (rmdir(entry->fts_accpath) == 0)
+        return 0;
+    vlsys_log(LOG_ERR, "rmdir %s: %m", entry->fts_path);
+    return errno;
+}
+
+// 0, or the errno of a failed removal.
+static int visit(FTS *walk, FTSENT *entry) {
+    switch (entry->fts_info) {
+    case FTS_D:
+    case FTS_DNR:
+        return 0;
+    case FTS_DC:
+        vlsys_log(LOG_WARNING, "circular directory structure: %s", entry->fts_path);
+        fts_set(walk, entry, FTS_SKIP);
+        return 0;
+    case FTS_DEFAULT:
+    case FTS_F:
+    case FTS_NS:
+    case FTS_NSOK:
+    case FTS_SL:
+    case FTS_SLNONE:
+        return remove_file(entry);
+    case FTS_DP:
+        return remove_directory(entry);
+    case FTS_ERR:
+        vlsys_log(LOG_ERR, "traversal failed: %s: %s", entry->fts_path, strerror(entry->fts_errno));
+        fts_set(walk, entry, FTS_SKIP);
+        return 0;
+    default:
+        vlsys_log(LOG_ERR, "unspected failure: fts_info=%d: %s", entry->fts_info, entry->fts_path);
+        return 0;
+    }
+}
+
+// The next entry; null at the end, with errno 0, and when the walk failed.
+static FTSENT *next_entry(FTS *walk) {
+    errno = 0;
+    return fts_read(walk);
+}
+
+} // namespace vlsys
+
+using namespace vlsys;
+
+int vlsys_mkdir(const char *path, unsigned int mode) {
+    const Text copy(strndup(path, VLSYS_PATH_SIZE));
+    if (!copy) {
+        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", path, VLSYS_PATH_SIZE);
+        return -1;
+    }
+    char *const start = copy.get()[0] == '/' ? copy.get() + 1 : copy.get();
+    for (char *slash = strchr(start, '/'); slash; slash = strchr(slash + 1, '/')) {
+        *slash = '\0';
+        if (make_level(copy.get(), mode) != 0)
+            return -1;
+        *slash = '/';
+    }
+    return make_level(copy.get(), mode);
+}
+
+int vlsys_remove_tree(const char *path) {
+    if (!path)
+        return EFAULT;
+    if (path[0] == '\0')
+        return ENOENT;
+    char *const roots[] = {const_cast<char *>(path), nullptr};
+    const Walk walk(fts_open(roots, FTS_NOSTAT | FTS_PHYSICAL | FTS_XDEV, nullptr),
+                    CloseWalk{path});
+    if (!walk) {
+        vlsys_log(LOG_ERR, "fts_open  %s: %m", path);
+        return errno;
+    }
+    while (FTSENT *entry = next_entry(walk.get())) {
+        const int error = visit(walk.get(), entry);
+        if (error != 0)
+            return error;
+    }
+    if (errno != 0)
+        vlsys_log(LOG_ERR, "fts_read %s: %m", path);
+    return errno;
+}
