@@ -479,8 +479,7 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * Rebuilds the font cache: runs "fc-cache" with vlsys_system and waits for it without a limit.
  *
  * Returns the command's exit code (0 is success), its whole wait status when it was ended by a
- * signal, or a negative value when it could not be run: the negated errno, if there is one. Logs
- * only what vlsys_system logs.
+ * signal, or the negated errno when it could not be run. Logs only what vlsys_system logs.
  */
 VLSYS_API int vlsys_fc_cache(void);
 
