@@ -133,7 +133,7 @@ static File open_status() {
 // found the boards not ready, and the last scan's result.
 static bool wait_alive(int *polls, int *mask) {
     constexpr int poll_limit = 960;
-    constexpr struct timespec interval = {0, 29970030}; // a frame at 59.94i
+    constexpr struct timespec interval = {0, 29970030};
     for (*polls = 0;;) {
         *mask = vlsys_avio_scan_alive();
         if (*mask == VLSYS_AVIO_READY) {
