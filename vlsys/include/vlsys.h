@@ -230,25 +230,150 @@ typedef struct vlsys_gw6 {
 
 /* ---- Interfaces ------------------------------------------------------------------------------ */
 
+/*
+ * The names of the unit's interfaces, all but "lo" and "virbr*", in natural order (eth2 before
+ * eth10). When there are any and `pifn` is not null, *pifn receives an array of them, which the
+ * caller frees with free; otherwise *pifn is not written.
+ *
+ * Returns their number; 0 also when the kernel's list cannot be had, or there is no memory for the
+ * array (*pifn is then null).
+ */
 VLSYS_API int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]);
+
+/*
+ * Sets how the interface gets its addresses: the keys of
+ * <root>/etc/sysconfig/network-scripts/ifcfg-<name>, then the interface's IPv6 switches (lines
+ * "net.ipv6.conf.<name>.<switch> = <0 or 1>") in <root>/etc/sysctl.d/velmora. Of the record it
+ * takes ipv4_mode, with addr and netmask in Manual mode (prefix is only logged), and ipv6_mode,
+ * with addr and prefix of addr6[0] in Manual mode. Nothing is checked.
+ *
+ * Keys of the interface's file ("-": removed). GATEWAY, PREFIX, UUID, HWADDR, IPV6FORWARDING and
+ * IPV6_ROUTER are always removed, NM_CONTROLLED is always "no".
+ *
+ *   IPv4           Off, IPv6 too  Off   Manual       DHCP
+ *   ONBOOT         no             yes   yes          yes
+ *   BOOTPROTO      as it was      none  none         dhcp
+ *   IPADDR         as it was      -     addr         -
+ *   NETMASK        as it was      -     netmask      -
+ *
+ *   IPv6           Off            DHCP  Manual       Auto
+ *   IPV6INIT       no             yes   yes          yes
+ *   IPV6_AUTOCONF  no             yes   no           yes
+ *   IPV6ADDR       -              -     addr/prefix  -
+ *   DHCPV6C        -              yes   -            -
+ *
+ * Switches: Off disable_ipv6 1, the others as they were; Manual disable_ipv6, autoconf and
+ * accept_ra_pinfo 0; DHCP and Auto disable_ipv6 0, autoconf and accept_ra_pinfo 1.
+ *
+ * Returns 0; 14 (EFAULT) for a null name or record and 6 (ENXIO) for an interface that the kernel
+ * does not know, both silent and with no file touched; else the positive errno of the failed
+ * rewrite, the second file untouched when the first one failed.
+ * Logs at LOG_INFO "IPv4 (<name>): " and "IPv6 (<name>): ", each with "OFF", the address and prefix
+ * length, "DHCP" or "AUTO". Waits for each file to reach the disk.
+ */
 VLSYS_API int vlsys_set_netif(const char *name, const vlsys_ifconf *conf);
 
 /* ---- DNS ------------------------------------------------------------------------------------- */
 
+/*
+ * Sets the unit's name resolution: the keys PEERDNS, DOMAIN, DNS1 and DNS2 of
+ * <root>/etc/sysconfig/network-scripts/ifcfg-<name> of every interface, in natural order. The
+ * interface named in `iface` gets PEERDNS=yes in DHCP mode, and in Manual mode also `domain` (even
+ * when empty), server[0] and, when not empty, server[1]; in Off mode it gets PEERDNS=no, as every
+ * other interface does in any mode. Keys without a value here are removed. An `iface` that names
+ * none of the unit's interfaces is no failure.
+ *
+ * Returns 0; 14 (EFAULT) for a null record; 22 (EINVAL) when the mode is not Off and `iface` is
+ * empty (no file touched), or when it is Manual and server[0] is empty; 6 (ENXIO) when the unit has
+ * no interface; all these are silent. Else the positive errno of a failed rewrite, with "param:
+ * failed" logged. A failure leaves the files of earlier interfaces rewritten.
+ * Logs the setting of the DNS interface at LOG_INFO, each path and every other interface at
+ * LOG_DEBUG. Waits for each file to reach the disk.
+ */
 VLSYS_API int vlsys_set_dns_settings(const vlsys_dns *dns);
+
+/*
+ * Reads the name resolution into the record, which must not be null: `domain` (the last "domain" or
+ * "search" line, of several domains the first) and up to three servers as /etc/resolv.conf has them
+ * now, and the mode as the files /etc/sysconfig/network-scripts/ifcfg-<name> set it: Manual when
+ * one has DOMAIN, else Off when all have PEERDNS=no, else DHCP. `iface` is left empty. Without
+ * /etc/resolv.conf the whole record is zero (Off), without an interface the mode is Off.
+ *
+ * Returns 0, or the positive errno of a file that cannot be read: of /etc/resolv.conf with the
+ * record zero, of an interface's file with what was read before it.
+ */
 VLSYS_API int vlsys_get_dns_settings(vlsys_dns *dns);
 
 /* ---- Default gateways ------------------------------------------------------------------------ */
 
-VLSYS_API int vlsys_set_ipv4_default_gateway(const char *text);
+/*
+ * Sets the IPv4 default gateway: GATEWAY of <root>/etc/sysconfig/network is `addr`, whatever the
+ * mode, or removed when that is empty. Then, in <root>/etc/sysconfig/network-scripts/ifcfg-<name>
+ * of every interface, in natural order, METRIC, GATEWAY and GATEWAYDEV are removed, and DEFROUTE is
+ * removed when the interface may have a default route of its own, else "no". Every interface may
+ * when `addr` is not empty or the mode is Manual; otherwise only the one named in `iface`.
+ *
+ * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed rewrite,
+ * with earlier files rewritten.
+ * Logs "IPv4 GW " and the address, "none" (Off, Manual) or "dhcp" at LOG_INFO, each interface's
+ * DEFROUTE at LOG_DEBUG. Waits for each file to reach the disk.
+ */
 VLSYS_API int vlsys_set_ipv4_default_gateway2(const vlsys_gw4 *gw);
-VLSYS_API int vlsys_set_ipv6_default_gateway(const char *text);
+
+/*
+ * The same for a gateway address alone (mode Manual, cut to 15 characters), or for DHCP on no
+ * interface when the text is null or empty.
+ */
+VLSYS_API int vlsys_set_ipv4_default_gateway(const char *text);
+
+/*
+ * Sets the IPv6 default gateway: IPV6_DEFAULTGW of <root>/etc/sysconfig/network is `addr`, whatever
+ * the mode, or removed when that is empty. Then the lines
+ * "net.ipv6.conf.<name>.accept_ra_defrtr = <0 or 1>" of all interfaces are set in
+ * <root>/etc/sysctl.d/velmora, in one rewrite: 1 for an interface that may take a default route
+ * from router advertisements, by the rule of vlsys_set_ipv4_default_gateway2.
+ *
+ * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed step:
+ * the first file's rewrite (the second is then untouched), memory, or the second file's rewrite.
+ * Logs at LOG_INFO "IPv6 GW " and the address, "none" (Off, Manual), "dhcp" or "auto", and
+ * "IPv6 GW auto (<name>)" for each interface set to 1; the number of interfaces and the lines at
+ * LOG_DEBUG. Waits for each file to reach the disk.
+ */
 VLSYS_API int vlsys_set_ipv6_default_gateway2(const vlsys_gw6 *gw);
+
+/*
+ * The same for a gateway address alone (mode Manual, cut to 45 characters), or for Auto on no
+ * interface when the text is null or empty.
+ */
+VLSYS_API int vlsys_set_ipv6_default_gateway(const char *text);
 
 /* ---- Host name ------------------------------------------------------------------------------- */
 
+/*
+ * Sets HOSTNAME of <root>/etc/sysconfig/network: the name, cut to 1025 characters and otherwise
+ * unchecked, or "localhost" when it is null or empty. The running host name stays as it is.
+ *
+ * Returns 0, or the positive errno of the failed rewrite.
+ * Logs "hostname: <name>" at LOG_INFO. Waits for the file to reach the disk.
+ */
 VLSYS_API int vlsys_set_hostname(const char *name);
+
+/*
+ * Reads the running host name into a buffer of VLSYS_HOSTNAME_SIZE bytes.
+ * Returns 0; 14 (EFAULT) for a null buffer; else the positive errno. Logs nothing.
+ */
 VLSYS_API int vlsys_get_hostname(char *name);
+
+/*
+ * Sets the host name in <root>/etc/sysconfig/network, as vlsys_set_hostname does, and then the
+ * running one. The name must not be null. It may have 64 characters: labels of up to 63 letters,
+ * digits and single hyphens, which neither begin nor end a label, joined by dots; one dot may end
+ * it. The empty name is not refused: the file then has "localhost".
+ *
+ * Returns 0, also when the name is the running host name already (nothing is written; logged at
+ * LOG_INFO); 420 for a name that breaks these rules; else the positive errno of the failed step:
+ * when the kernel refuses the name, the file has it already.
+ */
 VLSYS_API int vlsys_set_hostname_immediately(const char *name);
 
 /* ---- Processes ------------------------------------------------------------------------------- */

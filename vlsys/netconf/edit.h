@@ -13,10 +13,13 @@ struct edit_item {
     const char *value; // written as it is, without quotes
 };
 
-// Rewrites the sysconfig file, applying the items in order; a missing file counts as empty, its
-// directory is made. Each item acts on the first line of its key that no earlier item took; keys to set
-// that the file lacks are appended. Comments and empty lines are dropped, every other line is kept byte for byte.
-// Returns 0, -14 for a null path or item array (silent), else the negated errno of the failed call, logged.
+// Rewrites the sysconfig file as a whole, mode 0644; a missing file counts as empty, its directory
+// is made. A line belongs to a key when it begins with the key and "=". Each item acts on the first
+// such line that no earlier item took; keys to set that the file lacks are appended in item order.
+// Comments and empty lines are dropped, all other lines are kept byte for byte; lines may be of any
+// length.
+// Returns 0; -14 for a null path or item array (silent); else the negated errno of the failed call,
+// logged, with the old file still in place (unless only its mode could not be set).
 int edit(const char *path, const edit_item *items, uint32_t count);
 
 // `edit`, with "edit(%s): failed" logged on failure; returns 0 or the positive errno.

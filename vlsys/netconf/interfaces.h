@@ -21,12 +21,24 @@ class InterfaceList {
     Owned<InterfaceName[]> names_;
 };
 
+// Whether the name is one of the virtual bridges, virbr*.
+bool is_virtual_bridge(const char *name);
+
+// Compares at most n characters, runs of digits by their number: eth2 is below eth10, eth01 below
+// eth1. Below, equal to or above 0. Numbers above 31 bits wrap, so the order is not always a
+// consistent one.
 int compare_natural(const char *a, const char *b, int n);
-// For qsort.
+
+// Two interface names, in the form that qsort takes.
 int compare_ifname(const void *a, const void *b);
-// The unit's primary interface; see the source for the order of the search.
+
+// The unit's primary interface: eth0, else enp0s25, else the first of the list. Found once and kept
+// for the life of the process. Returns its index with the name in `out` (VLSYS_IFNAME_SIZE bytes);
+// 0 when there is no interface; -14 for a null `out`.
 int get_primary_ifname(char *out);
-// 0 when the name is a well-formed host or domain name (the empty text is), else -1.
+
+// 0 when the name is a well-formed host or domain name (the empty text is), else -1. Logs a name or
+// label that is too long; silent for a null name and for a character that is out of place.
 int check_hostname_format(const char *name);
 
 } // namespace vlsys

@@ -1,0 +1,194 @@
+#include "core/lines.h"
+#include "core/log.h"
+#include "core/paths.h"
+#include "core/text.h"
+#include "netconf/interfaces.h"
+#include "netconf/keys.h"
+
+#include <cstring>
+#include <string_view>
+
+namespace vlsys {
+
+static constexpr Cell domain = field_1;
+static constexpr Cell server_1 = field_2;
+static constexpr Cell server_2 = field_3;
+
+enum DnsColumn { other_interface, dns_off, dns_dhcp, dns_manual };
+
+static constexpr KeyRow<4> dns_keys[] = {
+    // any other interface; the DNS interface: Off, DHCP, Manual
+    {"PEERDNS", {no, no, yes, yes}},
+    {"DOMAIN", {removed, removed, removed, domain}},
+    {"DNS1", {removed, removed, removed, server_1}},
+    {"DNS2", {removed, removed, removed, server_2}},
+};
+
+namespace {
+
+// A record's texts, terminated.
+struct DnsTexts {
+    explicit DnsTexts(const vlsys_dns &dns)
+        : domain(dns.domain), server{FieldText(dns.server[0]), FieldText(dns.server[1])} {}
+
+    FieldText<VLSYS_HOSTNAME_SIZE> domain;
+    FieldText<VLSYS_ADDR6_SIZE> server[2];
+};
+
+// What an interface's file says about DNS.
+struct DnsSettings {
+    bool peerdns_no;
+    bool has_domain;
+};
+
+} // namespace
+
+static DnsColumn column_of(const char *name, const vlsys_dns &dns) {
+    if (strncmp(name, dns.iface, sizeof dns.iface) != 0)
+        return other_interface;
+    switch (dns.mode) {
+    case VLSYS_MODE_OFF:
+        return dns_off;
+    case VLSYS_MODE_DHCP:
+        return dns_dhcp;
+    default:
+        return dns_manual;
+    }
+}
+
+static void log_column(const char *name, DnsColumn column, const DnsTexts &texts) {
+    switch (column) {
+    case other_interface:
+        vlsys_log(LOG_DEBUG, "PEERDNS=no (%s)", name);
+        break;
+    case dns_off:
+        vlsys_log(LOG_INFO, "DNS OFF (%s)", name);
+        break;
+    case dns_dhcp:
+        vlsys_log(LOG_INFO, "DNS DHCP (%s)", name);
+        break;
+    case dns_manual:
+        vlsys_log(LOG_INFO, "DNS %s, %s, %s (%s)", texts.domain.text, texts.server[0].text,
+                  texts.server[1].text, name);
+    }
+}
+
+static int set_dns_of(const char *name, const vlsys_dns &dns, const DnsTexts &texts) {
+    const SystemPath path(ifcfg_prefix, name);
+    vlsys_log(LOG_DEBUG, "%s", path.text);
+    const DnsColumn column = column_of(name, dns);
+    if (column == dns_manual && texts.server[0].is_empty())
+        return EINVAL;
+    log_column(name, column, texts);
+
+    ItemList list;
+    list.add(dns_keys, column,
+             {{texts.domain.text, texts.server[0].text,
+               texts.server[1].is_empty() ? nullptr : texts.server[1].text}});
+    const auto items = list.items();
+    const int result = edit(path.text, items.data(), static_cast<uint32_t>(items.size()));
+    if (result < 0)
+        vlsys_log(LOG_ERR, "%s", "param: failed");
+    return -result;
+}
+
+static void read_resolver(FILE *file, vlsys_dns *dns) {
+    int servers = 0;
+    char line[256];
+    while (read_line(file, line, sizeof line)) {
+        if (line[0] == '#' || line[0] == ';' || line[0] == '\n')
+            continue;
+        char *rest = nullptr;
+        const char *const word = strtok_r(line, " \t\n", &rest);
+        if (!word)
+            return;
+        const std::string_view keyword = word;
+        const char *value = strtok_r(nullptr, " \t\n", &rest);
+        if (!value)
+            value = "";
+        if (keyword.starts_with("domain") || keyword.starts_with("search"))
+            vlsys_strlcpy(dns->domain, value, sizeof dns->domain);
+        else if (keyword.starts_with("nameserver") && servers < VLSYS_DNS_COUNT)
+            vlsys_strlcpy(dns->server[servers++], value, VLSYS_ADDR6_SIZE);
+    }
+}
+
+static int read_dns_of(const char *name, DnsSettings *settings) {
+    const Text path = format_text("%s%s", ifcfg_prefix, name);
+    if (!path) {
+        vlsys_log(LOG_ERR, "asprintf(\"%s%s\"): %m", ifcfg_prefix, name);
+        return errno;
+    }
+    const File file(fopen(path.get(), "re"));
+    if (!file) {
+        vlsys_log(LOG_ERR, "%s: fopen(%s): %m", "vlsys_get_dns_settings", path.get());
+        return errno;
+    }
+    *settings = {};
+    char line[256];
+    Setting setting;
+    while (next_setting(file.get(), line, sizeof line, Quotes::keep, &setting)) {
+        settings->peerdns_no |=
+            strcmp(setting.key, "PEERDNS") == 0 && strcmp(setting.value, "no") == 0;
+        settings->has_domain |= strcmp(setting.key, "DOMAIN") == 0;
+    }
+    return 0;
+}
+
+// Off when the mode is still DHCP and every file read has PEERDNS=no, as the setter writes it.
+static int read_dns_mode(const InterfaceList &interfaces, uint32_t *mode) {
+    int files = 0;
+    int files_with_no = 0;
+    int result = 0;
+    *mode = VLSYS_MODE_DHCP;
+    for (const auto &name : interfaces) {
+        DnsSettings settings;
+        result = read_dns_of(name, &settings);
+        if (result != 0)
+            break;
+        if (settings.has_domain) {
+            *mode = VLSYS_MODE_MANUAL;
+            return 0;
+        }
+        files++;
+        files_with_no += settings.peerdns_no;
+    }
+    if (files_with_no > 0 && files_with_no == files)
+        *mode = VLSYS_MODE_OFF;
+    return result;
+}
+
+} // namespace vlsys
+
+using namespace vlsys;
+
+int vlsys_set_dns_settings(const vlsys_dns *dns) {
+    if (!dns)
+        return EFAULT;
+    if (dns->mode != VLSYS_MODE_OFF && dns->iface[0] == '\0')
+        return EINVAL;
+    const InterfaceList interfaces;
+    if (interfaces.count() == 0)
+        return ENXIO;
+    const DnsTexts texts(*dns);
+    for (const auto &name : interfaces) {
+        const int result = set_dns_of(name, *dns, texts);
+        if (result != 0)
+            return result;
+    }
+    return 0;
+}
+
+int vlsys_get_dns_settings(vlsys_dns *dns) {
+    *dns = {};
+    const File file(fopen(resolv_path, "re"));
+    if (!file) {
+        if (errno == ENOENT)
+            return 0;
+        vlsys_log(LOG_ERR, "%s: %m", resolv_path);
+        return errno;
+    }
+    read_resolver(file.get(), dns);
+    const InterfaceList interfaces;
+    return interfaces.count() == 0 ? 0 : read_dns_mode(interfaces, &dns->mode);
+}

@@ -1,0 +1,118 @@
+#include "netconf/interfaces.h"
+
+#include "core/log.h"
+
+#include <cstring>
+#include <net/if.h>
+
+namespace vlsys {
+
+namespace {
+
+struct FreeIndex {
+    void operator()(struct if_nameindex *index) const { if_freenameindex(index); }
+};
+using Index = std::unique_ptr<struct if_nameindex, FreeIndex>;
+
+} // namespace
+
+bool is_virtual_bridge(const char *name) {
+    return strncmp(name, "virbr", 5) == 0;
+}
+
+static bool is_listed(const char *name) {
+    return strcmp(name, "lo") != 0 && !is_virtual_bridge(name);
+}
+
+// A number, or the code of a character that is no digit; in 32 bits.
+static uint32_t value_at(const char *text) {
+    if (*text >= '0' && *text <= '9')
+        return static_cast<uint32_t>(strtol(text, nullptr, 10));
+    return static_cast<unsigned char>(*text);
+}
+
+int compare_natural(const char *a, const char *b, int n) {
+    for (; n > 0; a++, b++, n--) {
+        const uint32_t value_a = value_at(a);
+        const uint32_t value_b = value_at(b);
+        if (value_a != value_b)
+            return static_cast<int>(value_a - value_b);
+        if (*a != *b || *a == '\0')
+            return static_cast<unsigned char>(*a) - static_cast<unsigned char>(*b);
+    }
+    return 0;
+}
+
+int compare_ifname(const void *a, const void *b) {
+    return compare_natural(static_cast<const char *>(a), static_cast<const char *>(b),
+                           VLSYS_IFNAME_SIZE);
+}
+
+// Moves later names up to make room in a sorted array of `count` names. Unlike qsort it stays
+// inside the array whatever the comparison says.
+static void insert(InterfaceName *names, int count, const char *name) {
+    InterfaceName *place = names + count;
+    for (; place != names && compare_ifname(place - 1, name) > 0; --place)
+        memcpy(place, place - 1, sizeof *place);
+    vlsys_strlcpy(*place, name, sizeof *place);
+}
+
+InterfaceList::InterfaceList() {
+    InterfaceName *names = nullptr;
+    count_ = vlsys_get_ifname_list(&names);
+    names_.reset(names);
+}
+
+static struct {
+    uint32_t index; // 0: not found yet
+    InterfaceName name;
+} primary;
+
+static bool is_primary(const char *name) {
+    primary.index = if_nametoindex(name);
+    vlsys_strlcpy(primary.name, name, sizeof primary.name);
+    return primary.index > 0;
+}
+
+static bool find_primary() {
+    if (is_primary("eth0") || is_primary("enp0s25"))
+        return true;
+    const InterfaceList interfaces;
+    return interfaces.count() > 0 && is_primary(*interfaces.begin());
+}
+
+int get_primary_ifname(char *out) {
+    if (!out)
+        return -EFAULT;
+    if (primary.index == 0 && !find_primary())
+        return 0;
+    vlsys_strlcpy(out, primary.name, sizeof primary.name);
+    return static_cast<int>(primary.index);
+}
+
+} // namespace vlsys
+
+using namespace vlsys;
+
+int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]) {
+    const Index index(if_nameindex());
+    if (!index) {
+        vlsys_log(LOG_ERR, "%s: %m", "if_nameindex");
+        return 0;
+    }
+    int count = 0;
+    for (const struct if_nameindex *entry = index.get(); entry->if_name; ++entry)
+        count += is_listed(entry->if_name);
+    if (count == 0 || !pifn)
+        return count;
+    *pifn = static_cast<InterfaceName *>(calloc(static_cast<size_t>(count), sizeof **pifn));
+    if (!*pifn) {
+        vlsys_log(LOG_ERR, "*pifn = calloc(%d, %d): %m", VLSYS_IFNAME_SIZE, count);
+        return 0;
+    }
+    int listed = 0;
+    for (const struct if_nameindex *entry = index.get(); entry->if_name; ++entry)
+        if (is_listed(entry->if_name))
+            insert(*pifn, listed++, entry->if_name);
+    return count;
+}
