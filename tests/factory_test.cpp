@@ -8,15 +8,15 @@
 
 using namespace test;
 
-struct Run {
+struct ToolRun {
     std::string output;
     int status; // exit status
 };
 
 // Runs the tool, or with a prefix the command that runs it.
-static Run run_tool(const std::string &prefix = "") {
+static ToolRun run_tool(const std::string &prefix = "") {
     FILE *const pipe = popen((prefix + " " FACTORY_PROGRAM).c_str(), "r");
-    Run result;
+    ToolRun result;
     for (int c = 0; (c = getc(pipe)) != EOF;)
         result.output.push_back(static_cast<char>(c));
     const int status = pclose(pipe);
@@ -54,7 +54,7 @@ TEST_F(Factory, SetsUpTheUnitForItsDestination) {
         SCOPED_TRACE(c.kind);
         unit::make_unit_files(c.kind);
         for (int again = 0; again < 2; again++) { // a second run changes nothing
-            const Run tool = run_tool();
+            const ToolRun tool = run_tool();
             EXPECT_EQ(tool.output,
                       std::string("dest: ") + c.destination + "\ntimezone: " + c.zone + "\n");
             EXPECT_EQ(tool.status, 0);
@@ -147,7 +147,7 @@ TEST_F(Factory, EndsAtTheFirstFailureOfAWrite) {
     for (size_t i = 0; i < std::size(renames); i++) {
         SCOPED_TRACE(renames[i].file + std::string(" ") + std::to_string(renames[i].number));
         unit::make_unit_files("sy");
-        const Run tool = run_tool("ASAN_OPTIONS=detect_leaks=0 strace -qq -o /run/trace -e "
+        const ToolRun tool = run_tool("ASAN_OPTIONS=detect_leaks=0 strace -qq -o /run/trace -e "
                                   "trace=/^rename -e inject=/^rename:error=EIO:when=" +
                                   std::to_string(i + 1));
         EXPECT_EQ(tool.output, good_start + error(renames[i].function, renames[i].number));
@@ -159,7 +159,7 @@ TEST_F(Factory, EndsAtTheFirstFailureOfAWrite) {
 
 TEST_F(Factory, EndsAtTheFirstFailureOfAStep) {
     write_file("/run/serial-number", "");
-    Run tool = run_tool();
+    ToolRun tool = run_tool();
     EXPECT_EQ(tool.output,
               good_start + error("factory_make_hostname", 53) + error("factory_init_network", 90));
     EXPECT_EQ(tool.status, 255);
