@@ -148,8 +148,8 @@ TEST_F(Factory, EndsAtTheFirstFailureOfAWrite) {
         SCOPED_TRACE(renames[i].file + std::string(" ") + std::to_string(renames[i].number));
         unit::make_unit_files("sy");
         const ToolRun tool = run_tool("ASAN_OPTIONS=detect_leaks=0 strace -qq -o /run/trace -e "
-                                  "trace=/^rename -e inject=/^rename:error=EIO:when=" +
-                                  std::to_string(i + 1));
+                                      "trace=/^rename -e inject=/^rename:error=EIO:when=" +
+                                      std::to_string(i + 1));
         EXPECT_EQ(tool.output, good_start + error(renames[i].function, renames[i].number));
         EXPECT_EQ(tool.status, 255);
         EXPECT_EQ(renamed_to(read_file("/run/trace")), done += renames[i].file + std::string("\n"));

@@ -131,7 +131,7 @@ std::vector<std::string> take_raw_log() {
 
 // "<134>Jan  1 00:00:00 ident[pid]: [tid]: text" becomes "6 text".
 static std::string plain(const std::string &datagram) {
-    const int priority = atoi(datagram.c_str() + 1);
+    const long priority = strtol(datagram.c_str() + 1, nullptr, 10);
     size_t start = datagram.find("]: [");
     start = start == std::string::npos ? start : datagram.find("]: ", start + 4);
     EXPECT_NE(start, std::string::npos) << datagram;
@@ -168,7 +168,7 @@ extern "C" unsigned int __wrap_sleep(unsigned int seconds) {
     return 0;
 }
 
-extern "C" int __wrap_nanosleep(const struct timespec *request, struct timespec *) {
+extern "C" int __wrap_nanosleep(const struct timespec *request, struct timespec * /*remaining*/) {
     waits.push_back(request->tv_sec * INT64_C(1000000000) + request->tv_nsec);
     if (nanosleep_failure_in == 0 || --nanosleep_failure_in > 0)
         return 0;

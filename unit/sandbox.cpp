@@ -155,10 +155,10 @@ static void copy_files() {
     check(error, files);
 }
 
-void make_unit_files(const char *name) {
-    const Kind *const kind = find_kind(name);
+void make_unit_files(const char *kind_name) {
+    const Kind *const kind = find_kind(kind_name);
     if (!kind)
-        fail(name, "no such kind of unit");
+        fail(kind_name, "no such kind of unit");
     std::error_code error;
     for (const char *path : {"/etc/sysconfig", "/etc/sysctl.d", "/etc/localtime"})
         fs::remove_all(path, error);

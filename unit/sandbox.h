@@ -19,7 +19,7 @@ void enter_namespaces();
 
 // Puts the unit's files in place afresh: network files, clock file, link to the zone file, version
 // file, commands, and the driver status that belongs to the kind of unit (kinds.h).
-void make_unit_files(const char *kind);
+void make_unit_files(const char *kind_name);
 
 // A veth pair with carrier; its other end has the same name outside.
 void add_interface(const char *name);

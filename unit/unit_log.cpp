@@ -18,7 +18,8 @@ static const char *const levels[] = {"emerg",   "alert",  "crit", "error",
 static void print_message(const std::string &datagram) {
     const size_t thread = datagram.find("]: [");
     const size_t text = thread == std::string::npos ? thread : datagram.find("]: ", thread + 4);
-    printf("%-8s%s\n", levels[LOG_PRI(atoi(datagram.c_str() + 1))],
+    const long priority = strtol(datagram.c_str() + 1, nullptr, 10);
+    printf("%-8s%s\n", levels[LOG_PRI(priority)],
            datagram.c_str() + (text == std::string::npos ? 0 : text + 3));
     fflush(stdout);
 }
