@@ -598,6 +598,45 @@ VLSYS_API int vlsys_get_serial_number(char *buffer, size_t size);
  */
 VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 
+/* ---- Validation of a network setting --------------------------------------------------------- */
+
+/*
+ * A check code names what is wrong with a setting: the interface concerned by its position in the
+ * list (0 for the first or only one, and for faults that concern no single interface), the field
+ * and the kind of fault. Every check code is VLSYS_CHECK_CODE(0, 0, 0), that is 0x100, or above.
+ */
+#define VLSYS_CHECK_CODE(position, field, kind) ((((position) + 1) << 8) | ((field) << 4) | (kind))
+#define VLSYS_CHECK_IS_CODE(result) ((result) >= 0x100)
+#define VLSYS_CHECK_POSITION(code) (((code) >> 8) - 1)
+#define VLSYS_CHECK_FIELD(code) (((code) >> 4) & 0xF)
+#define VLSYS_CHECK_KIND(code) ((code)&0xF)
+
+/* Fields. A fault of vlsys_dns server[2] carries VLSYS_CHECK_FIELD_IPV6_ADDR. */
+#define VLSYS_CHECK_FIELD_IPV4_ADDR 1
+#define VLSYS_CHECK_FIELD_IPV4_NETMASK 2
+#define VLSYS_CHECK_FIELD_IPV4_GATEWAY 3
+#define VLSYS_CHECK_FIELD_DNS_DOMAIN 4
+#define VLSYS_CHECK_FIELD_DNS_PRIMARY 5
+#define VLSYS_CHECK_FIELD_DNS_SECONDARY 6
+#define VLSYS_CHECK_FIELD_IPV6_ADDR 7
+#define VLSYS_CHECK_FIELD_IPV6_PREFIX 8
+#define VLSYS_CHECK_FIELD_IPV6_GATEWAY 9
+#define VLSYS_CHECK_FIELD_HOSTNAME 10
+#define VLSYS_CHECK_FIELD_IFNAME 11
+
+/* Kinds of fault. */
+#define VLSYS_CHECK_KIND_INVALID 1     /* missing, no valid address, or link-local without scope */
+#define VLSYS_CHECK_KIND_NETMASK 2     /* netmask bits not contiguous */
+#define VLSYS_CHECK_KIND_UNREACHABLE 3 /* outside every subnet, or of a family that is Off */
+#define VLSYS_CHECK_KIND_SYNTAX 4      /* host or domain name not well-formed */
+#define VLSYS_CHECK_KIND_NETWORK 5     /* the network address of the interface's subnet */
+#define VLSYS_CHECK_KIND_BROADCAST 6   /* the broadcast address of the interface's subnet */
+#define VLSYS_CHECK_KIND_PREFIX 7      /* IPv6 prefix length above 128 */
+#define VLSYS_CHECK_KIND_RANGE 8       /* address of a range that the field does not allow */
+#define VLSYS_CHECK_KIND_NO_IFACE 9    /* no such interface */
+#define VLSYS_CHECK_KIND_OVERLAP 10    /* two interfaces in one subnet */
+#define VLSYS_CHECK_KIND_MODE 11       /* a mode that another setting does not support */
+
 /* ---- Files and directories ------------------------------------------------------------------- */
 
 /*

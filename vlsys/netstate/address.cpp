@@ -1,0 +1,133 @@
+#include "netstate/address.h"
+
+#include "core/log.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <memory>
+#include <netdb.h>
+
+namespace vlsys {
+
+// By field number. The texts are those of the appliance's log, as they always were.
+static constexpr const char *field_labels[] = {
+    "",
+    "IPv4 address",
+    "IPv4 netmask",
+    "IPv4 defautl gateway ",
+    "DNS domain",
+    "DNS primary server",
+    "DNS secondary server",
+    "IPv6 address",
+    "IPv6 prefixlen",
+    "IPv6 default gateway",
+    "hostname",
+};
+
+static constexpr int first_netmask = VLSYS_CHECK_CODE(0, VLSYS_CHECK_FIELD_IPV4_NETMASK, 0);
+
+struct FreeAddrinfo {
+    void operator()(addrinfo *list) const { freeaddrinfo(list); }
+};
+
+int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, size_t textcap,
+                 const char *label) {
+    // The resolver may write a part of what turns out too long for the caller's buffer.
+    char written[NI_MAXHOST];
+    const auto capacity = static_cast<socklen_t>(std::min(textcap, sizeof(written)));
+    const int error = getnameinfo(addr, addrlen, written, capacity, nullptr, 0, NI_NUMERICHOST);
+    if (error == 0) {
+        vlsys_strlcpy(text, written, textcap);
+        return 0;
+    }
+    if (error == EAI_SYSTEM) {
+        vlsys_log(LOG_ERR, "%s: getnameinfo: %m", label);
+        return errno;
+    }
+    vlsys_log(LOG_ERR, "%s: getnameinfo: %s", label, gai_strerror(error));
+    return error;
+}
+
+// The steps that both families share: the address of the text, and the field's label.
+static int text_to_addr(int family, void *out, size_t size, const char *field, size_t capacity,
+                        int fieldcode, const char **label) {
+    const int number = VLSYS_CHECK_FIELD(fieldcode);
+    if (number < VLSYS_CHECK_FIELD_IPV4_ADDR || number > VLSYS_CHECK_FIELD_HOSTNAME)
+        return EINVAL;
+    *label = field_labels[number];
+    if (!field) {
+        vlsys_log(LOG_ERR, "%s: str: %m", *label);
+        return EFAULT;
+    }
+    if (!out) {
+        vlsys_log(LOG_ERR, "%s: sa: %m", *label);
+        return EFAULT;
+    }
+
+    // A field that is full has no NUL.
+    char text[VLSYS_ADDR6_SIZE + 1];
+    snprintf(text, sizeof(text), "%.*s", static_cast<int>(capacity), field);
+    addrinfo hints = {};
+    hints.ai_flags = AI_NUMERICHOST;
+    hints.ai_family = family;
+    addrinfo *result = nullptr;
+    const int error = getaddrinfo(text, nullptr, &hints, &result);
+    if (error == EAI_SYSTEM) {
+        vlsys_log(LOG_ERR, "%s: %s: %m", *label, text);
+        return errno;
+    }
+    if (error != 0) {
+        vlsys_log(LOG_ERR, "%s: %s: %s", *label, text, gai_strerror(error));
+        return fieldcode | VLSYS_CHECK_KIND_INVALID;
+    }
+    const std::unique_ptr<addrinfo, FreeAddrinfo> list(result);
+    memcpy(out, list->ai_addr, size);
+    return 0;
+}
+
+static bool is_global_unicast(const in6_addr &address) {
+    return address.s6_addr[0] >> 5 == 1;
+}
+
+static bool is_unique_local(const in6_addr &address) {
+    return address.s6_addr[0] >> 1 == 0x7E;
+}
+
+int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
+    const char *label = nullptr;
+    const int error =
+        text_to_addr(AF_INET6, out, sizeof(*out), text, VLSYS_ADDR6_SIZE, fieldcode, &label);
+    if (error != 0)
+        return error;
+
+    const in6_addr &address = out->sin6_addr;
+    if (IN6_IS_ADDR_LINKLOCAL(&address)) {
+        if (out->sin6_scope_id == 0)
+            return fieldcode | VLSYS_CHECK_KIND_INVALID;
+    } else if (!is_global_unicast(address) && !is_unique_local(address)) {
+        return fieldcode | VLSYS_CHECK_KIND_RANGE;
+    }
+    return addr_to_text(reinterpret_cast<const sockaddr *>(out), sizeof(*out), text,
+                        VLSYS_ADDR6_SIZE, label);
+}
+
+int check_ipv4_text(struct sockaddr_in *out, char *text, size_t textcap, int fieldcode) {
+    const char *label = nullptr;
+    const int error = text_to_addr(AF_INET, out, sizeof(*out), text, textcap, fieldcode, &label);
+    if (error != 0)
+        return error;
+
+    const uint32_t address = ntohl(out->sin_addr.s_addr);
+    if (fieldcode != first_netmask &&
+        (address == 0 || address >> 24 == 127 || address >> 24 >= 224))
+        return fieldcode | VLSYS_CHECK_KIND_RANGE;
+    return addr_to_text(reinterpret_cast<const sockaddr *>(out), sizeof(*out), text, textcap,
+                        label);
+}
+
+int parse_uint(const char *text, int base) {
+    const long long value = strtoll(text, nullptr, base);
+    return value < 0 || value > UINT32_MAX ? -1 : static_cast<int>(value);
+}
+
+} // namespace vlsys
