@@ -637,6 +637,80 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 #define VLSYS_CHECK_KIND_OVERLAP 10    /* two interfaces in one subnet */
 #define VLSYS_CHECK_KIND_MODE 11       /* a mode that another setting does not support */
 
+/*
+ * Checks whether the network setting of one interface can be applied, and brings it into the form
+ * that the setters write. The checks stop at the first fault, in the order given here; what was
+ * brought into form up to there stays so. The texts are those of the records' fields, where one
+ * that is full may lack its NUL; gw4 is a buffer of VLSYS_ADDR4_SIZE, gw6 one of VLSYS_ADDR6_SIZE
+ * bytes, both empty for no gateway, and hostname a text in one of at least 64.
+ *
+ * - The interface exists.
+ * - IPv4 Manual: addr, netmask (a prefix length of 8 to 30 becomes a mask) and the gateway become
+ *   canonical, broadaddr is filled. The gateway lies in the subnet; neither it nor addr is the
+ *   network or broadcast address, which a netmask of 255.255.255.255 does not have. IPv4 DHCP: the
+ *   gateway becomes canonical. IPv4 Off: it is not looked at.
+ * - IPv6 the same, with addr6[0]: a link-local gateway needs no subnet but its "%interface", and
+ *   there is no broadcast address.
+ * - DNS is turned Off, with a warning, when both families are Off, or when it is DHCP and neither
+ *   family is.
+ * - DNS Manual: the domain is empty or well-formed. server[0] is given; it and server[1] become
+ *   canonical, a repeated server[1] is emptied. A server belongs to a family that is on; one of a
+ *   Manual family lies in its subnet or has a gateway to go through, and has no address whose host
+ *   bits are all zero or that is the broadcast address. server[2] is not looked at.
+ * - dns->iface becomes the interface, whatever the DNS mode.
+ * - The host name is well-formed and at most 64 characters long; an empty one becomes "localhost",
+ *   with a warning.
+ *
+ * Returns 0, a check code at position 0, EFAULT for a null argument, or the errno value or negative
+ * resolver code of a failed address conversion; that of broadaddr alone does not stop the checks.
+ * Logs the modes at LOG_INFO at the start and when all is well, and each fault at LOG_ERR. Silent:
+ * null arguments, an interface that does not exist, an IPv6 prefix length above 128, an address of
+ * a range that its field does not allow, a link-local address without scope, a malformed name and
+ * a missing server[0].
+ * Asks the kernel for interface names only; no name is looked up, nothing blocks.
+ */
+VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,
+                                  char *hostname);
+
+/*
+ * Checks the network setting of `count` interfaces at once, in the manner of vlsys_address_check;
+ * what differs:
+ *
+ * - Interfaces: "eth1" need not exist, and "lo" is refused. A prefix of 8 to 30 replaces the
+ *   netmask; otherwise it becomes the netmask's length, which must be 8 to 30.
+ * - No two interfaces have the same IPv4 address, and none has a Manual address in the subnet of
+ *   another one, in either family (in IPv6 silent).
+ * - A Manual gateway needs an interface of its family that is on. It lies in the subnet of any
+ *   Manual interface, or one learns its routes (DHCP, IPv6 also Auto), or it is link-local; it is
+ *   no subnet's network or broadcast address. gw4->iface becomes the last interface whose subnet
+ *   holds it.
+ * - A learnt gateway (DHCP, IPv6 also Auto) names an interface, and one of the list only if that
+ *   interface's mode is neither Off nor Manual.
+ * - A gateway record that is Off, Manual without address or of an unknown mode is cleared.
+ * - A DNS mode other than Off without an interface that is on, and DHCP without one on DHCP, are
+ *   faults.
+ * - DNS Manual: of equal servers the last one stays, the others are emptied; at least one of the
+ *   three is given. A server needs an interface of its family that is on, and lies in the subnet of
+ *   any Manual interface, or one learns its routes, or the Manual gateway of its family was
+ *   accepted; it is no subnet's network or broadcast address.
+ * - dns->iface becomes the first interface that is on (DNS Manual) or on DHCP (DNS DHCP), and stays
+ *   as it is otherwise.
+ *
+ * The order is: each interface's name and IPv4 addressing, IPv4 subnets against each other, IPv4
+ * gateway; each interface's IPv6 addressing, IPv6 subnets against each other, IPv6 gateway; DNS;
+ * host name.
+ *
+ * Returns as vlsys_address_check, EFAULT also for a count below 1, and the errno value of a failed
+ * allocation. A check code carries the position of the interface whose addressing is at fault, or
+ * whose network or broadcast address a gateway or server is; else position 0.
+ * Logs at LOG_INFO the modes in one word ("MD__M_M4_": the IPv4 modes of the first two interfaces,
+ * their IPv6 modes, IPv4 and IPv6 gateway, DNS and the families of its first two servers; a learnt
+ * gateway is "0" or "1" for the interface it names, else "!") and the result, "NG (<code>)" or
+ * "OK"; values on the way at LOG_DEBUG.
+ */
+VLSYS_API int vlsys_address_check2(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *gw6,
+                                   vlsys_dns *dns, char *hostname);
+
 /* ---- Files and directories ------------------------------------------------------------------- */
 
 /*
