@@ -94,10 +94,11 @@ TEST_F(Core, SystemLogLinesCarryIdentityProcessAndThread) {
     EXPECT_EQ(raw[0].substr(raw[0].find("vlsys-tests")),
               "vlsys-tests[" + id + "]: [" + id + "]: open(x): No such file or directory");
 
-    vlsys_log(LOG_INFO, "%s", std::string(1 << 20, 'x').c_str()); // more than a datagram holds
-    unlink("/dev/log");
+    const int opened = open_descriptors();
     vlsys_closelog();
-    vlsys_log(LOG_INFO, "lost");
+    EXPECT_EQ(open_descriptors(), opened - 1);
+    unlink("/dev/log");
+    vlsys_log(LOG_INFO, "%s", std::string(1 << 20, 'x').c_str()); // lost, and no more
     EXPECT_EQ(vlsys_setlogmask(LOG_UPTO(LOG_ERR)), 0xFF);
     EXPECT_EQ(vlsys_setlogmask(0xFF), LOG_UPTO(LOG_ERR));
 }

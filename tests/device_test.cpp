@@ -104,7 +104,7 @@ TEST_F(Device, SerialNumberIsTakenFromTheListing) {
         {"MainSerialNumber : 12345678901234567890\n0\n", "20 123456789012345"},
         {string(8191, 'x') + "MainSerialNumber : 1\n0\n", "0 unchanged"},
         {"MainSerialNumber : 5\n9\n256\n", "-201 5"},
-        {"MainSerialNumber : 5\n \t9 256\n", "-209 5"},
+        {"MainSerialNumber : 5\n \t139 256\n", "-339 5"},
     };
     for (const auto &[output, expected] : cases) {
         const ScriptedSurrogate surrogate("7\n", ScriptedSurrogate::Then::await_start, output);

@@ -70,6 +70,11 @@ TEST_F(Netconf, EditFailsWithTheOldFileInPlace) {
     run("dd if=/dev/zero of=/run/full/fill bs=4k status=none 2>/dev/null || true");
     EXPECT_EQ(edit_all("/run/full/f", items), -ENOSPC); // seen when the stream is flushed
     EXPECT_EQ(take_log(), "3 fputs(C=2\n): No space left on device\n");
+    write_file("/run/f", "A=1\n#" + std::string(1000, 'x') + "\n"); // shows what was written last
+    run("ln -s /run/f /run/full/g");
+    EXPECT_EQ(edit_all("/run/full/g", {{1, "B", ""}}), -ENOSPC);
+    EXPECT_EQ(take_log(), "3 fputs(A=1\n): No space left on device\n");
+    unlink("/run/full/g");
     EXPECT_EQ(list_directory("/run/full") + read_file("/run/full/f"), "f\nfill\nA=1\n");
 }
 

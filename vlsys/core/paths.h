@@ -18,6 +18,7 @@ inline constexpr char zoneinfo_prefix[] = "/usr/share/zoneinfo/"; // + zone name
 inline constexpr char resolv_path[] = "/etc/resolv.conf";
 inline constexpr char ipv6_conf_path[] = "/proc/sys/net/ipv6/conf";
 inline constexpr char avio_status_path[] = "/proc/driver/VlAvio/status";
+inline constexpr char serial_number_command[] = "/usr/bin/Tovrin version -d krd";
 inline constexpr char version_path[] = "/etc/velmora-version";
 inline constexpr char block_path[] = "/sys/block";
 

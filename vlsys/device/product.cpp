@@ -2,6 +2,7 @@
 
 #include "core/lines.h"
 #include "core/log.h"
+#include "core/paths.h"
 #include "device/avio.h"
 
 #include <cerrno>
@@ -68,10 +69,9 @@ int vlsys_get_hdcp_capability(void) {
 }
 
 int vlsys_get_serial_number(char *buffer, size_t size) {
-    static constexpr char command[] = "/usr/bin/Tovrin version -d krd";
-    FILE *const stream = vlsys_popen(command);
+    FILE *const stream = vlsys_popen(serial_number_command);
     if (!stream) {
-        vlsys_log(LOG_ERR, "popen(\"%s\", \"re\"): %m", command);
+        vlsys_log(LOG_ERR, "popen(\"%s\", \"re\"): %m", serial_number_command);
         return -errno;
     }
     int status = 0;

@@ -5,8 +5,10 @@
  * synchronous call on the caller's thread. The library has no threads and no locks: its few
  * process-wide states (paths, log, driver status table, primary interface) belong to one thread.
  *
- * Setters change configuration files only. What they write takes effect at the next network restart
- * or boot.
+ * Setters change configuration files only, unless said otherwise. What they write takes effect at
+ * the next network restart or boot. Rewriting a sysconfig file or the sysctl drop-in drops its
+ * comments and empty lines, changes the first line of a key only, and makes a missing file and its
+ * directories (mode 0755).
  *
  * Logging: every failed call is logged at LOG_ERR with a message that names the call, warnings at
  * LOG_WARNING, settings written and values read at LOG_INFO, traces at LOG_DEBUG. Each operation
@@ -119,7 +121,10 @@ VLSYS_API void vlsys_vlog(int priority, const char *format, va_list arguments) V
  */
 VLSYS_API void vlsys_openlog(const char *ident, int option, int facility);
 
-/* Closes the system log; in standard-output mode does nothing. Logging again opens it again. */
+/*
+ * Closes the system log; in standard-output mode does nothing. Logging again opens it again, under
+ * the program's short name.
+ */
 VLSYS_API void vlsys_closelog(void);
 
 /*
@@ -169,7 +174,8 @@ VLSYS_API size_t vlsys_get_timezone(char *buffer, size_t size);
 
 /*
  * The present offset of local time from UTC, such as "+0800", in a buffer of 6 bytes or more.
- * Returns its length, 5; 0 when the buffer is null or too small (its content is then unspecified).
+ * Returns its length, 5; 0 when the buffer is null or too small (its content is then unspecified),
+ * or the local time cannot be told (logged).
  */
 VLSYS_API size_t vlsys_get_utc_offset(char *buffer, size_t size);
 
@@ -284,11 +290,11 @@ VLSYS_API int vlsys_set_netif(const char *name, const vlsys_ifconf *conf);
  * none of the unit's interfaces is no failure.
  *
  * Returns 0; 14 (EFAULT) for a null record; 22 (EINVAL) when the mode is not Off and `iface` is
- * empty (no file touched), or when it is Manual and server[0] is empty; 6 (ENXIO) when the unit has
- * no interface; all these are silent. Else the positive errno of a failed rewrite, with "param:
- * failed" logged. A failure leaves the files of earlier interfaces rewritten.
- * Logs the setting of the DNS interface at LOG_INFO, each path and every other interface at
- * LOG_DEBUG. Waits for each file to reach the disk.
+ * empty (no file touched), or when it is Manual for one of the unit's interfaces and server[0] is
+ * empty; 6 (ENXIO) when the unit has no interface; all these are silent. Else the positive errno of
+ * a failed rewrite, with "param: failed" logged. A failure leaves the files of earlier interfaces
+ * rewritten. Logs the setting of the DNS interface at LOG_INFO, each path and every other interface
+ * at LOG_DEBUG. Waits for each file to reach the disk.
  */
 VLSYS_API int vlsys_set_dns_settings(const vlsys_dns *dns);
 
@@ -413,8 +419,10 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  *   LOG_WARNING) the command is run directly, as each operation says. After it was made there is no
  *   fallback: the operation fails, and errno says why.
  * - A request that could only be sent in part is not run.
- * - They log the working directory at LOG_DEBUG and the command at LOG_INFO (vlsys_popen: the whole
- *   request at LOG_DEBUG). A reply that is missing or is no number is not logged.
+ * - When connected, they log the working directory at LOG_DEBUG and the command at LOG_INFO
+ *   (vlsys_popen: the whole request at LOG_DEBUG), and what each says below. A reply that is
+ *   missing or is no number is not logged. A command that is run directly is not logged, but for
+ *   what vlsys_spawn_direct logs.
  * - They block until the answer comes; no time limit. No signal is raised when the surrogate parent
  *   goes away, and the connection is closed in programs that the process executes.
  */
@@ -508,7 +516,7 @@ VLSYS_API int vlsys_avio_read_config(void);
 /*
  * The Config register of the board with a device id of VLSYS_AVIO_*: 0 after a normal boot, 1 after
  * a boot from the backup image, other values are illegal. Reads the registers first unless the last
- * read succeeded.
+ * read of an open status file succeeded.
  *
  * Returns the register's 32 bits, or -1 for another device id and when the registers cannot be
  * read; an illegal register of 0xffffffff reads as -1 too. Logs only what vlsys_avio_read_config
@@ -736,10 +744,11 @@ VLSYS_API int vlsys_mkdir(const char *path, unsigned int mode);
  * other file systems mounted below are not entered. The working directory changes during the call.
  *
  * Returns 0, or a positive errno: EFAULT for a null path and ENOENT for an empty one (neither is
- * logged), else that of the first removal that failed, which ends the work: what was not yet
- * removed stays.
- * An entry that the walk cannot enter is logged at LOG_ERR (a directory cycle at LOG_WARNING) and
- * passed over.
+ * logged), else that of the first removal that failed, or of the walk itself, which ends the work:
+ * what was not yet removed stays.
+ * A directory that cannot be read is passed over silently: removing its parent then fails, or, when
+ * it is the path itself, it stays and the result is 0. Any other entry that cannot be walked is
+ * logged at LOG_ERR (a directory cycle at LOG_WARNING) and passed over.
  */
 VLSYS_API int vlsys_remove_tree(const char *path);
 

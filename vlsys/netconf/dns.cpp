@@ -2,6 +2,7 @@
 #include "core/log.h"
 #include "core/paths.h"
 #include "core/text.h"
+#include "netconf/ifcfg.h"
 #include "netconf/interfaces.h"
 #include "netconf/keys.h"
 
@@ -114,16 +115,9 @@ static void read_resolver(FILE *file, vlsys_dns *dns) {
 }
 
 static int read_dns_of(const char *name, DnsSettings *settings) {
-    const Text path = format_text("%s%s", ifcfg_prefix, name);
-    if (!path) {
-        vlsys_log(LOG_ERR, "asprintf(\"%s%s\"): %m", ifcfg_prefix, name);
+    const File file = open_ifcfg("vlsys_get_dns_settings", name);
+    if (!file)
         return errno;
-    }
-    const File file(fopen(path.get(), "re"));
-    if (!file) {
-        vlsys_log(LOG_ERR, "%s: fopen(%s): %m", "vlsys_get_dns_settings", path.get());
-        return errno;
-    }
     *settings = {};
     char line[256];
     Setting setting;

@@ -5,6 +5,7 @@
 
 #include <cstring>
 #include <string_view>
+#include <utility>
 
 namespace vlsys {
 
@@ -128,9 +129,12 @@ static int next_line(FILE *old, const char *path, LineBuffer *buffer, std::strin
     return -errno;
 }
 
-// The buffer stays the caller's: a failed commit shows the line last written.
-static int write_new(FILE *old, const char *path, WorkingList *list, LineBuffer *buffer,
+// The buffers stay the caller's: a failed commit shows the line last written, which stands in the
+// one while the other takes the lines that are dropped.
+static int write_new(FILE *old, const char *path, WorkingList *list, LineBuffer (&buffers)[2],
                      Replacement *replacement) {
+    LineBuffer *buffer = &buffers[0];
+    LineBuffer *last_written = &buffers[1];
     std::string_view line;
     bool in_line = false; // the line last written has no line feed
     int result = 0;
@@ -145,6 +149,7 @@ static int write_new(FILE *old, const char *path, WorkingList *list, LineBuffer 
         in_line = line.back() != '\n';
         if ((result = replacement->write(line)) != 0)
             return result;
+        std::swap(buffer, last_written);
     }
     for (const auto *entry = list->begin(); result == 0 && entry->line; ++entry) {
         if (entry->used || entry->removing)
@@ -162,7 +167,7 @@ int edit(const char *path, const edit_item *items, uint32_t count) {
     if (!path || !items)
         return -EFAULT;
     WorkingList list;
-    LineBuffer line;
+    LineBuffer lines[2];
     File old;
     Replacement replacement;
     int result = make_directory_of(path);
@@ -175,7 +180,7 @@ int edit(const char *path, const edit_item *items, uint32_t count) {
     if (result == 0)
         result = replacement.open();
     if (result == 0)
-        result = write_new(old.get(), path, &list, &line, &replacement);
+        result = write_new(old.get(), path, &list, lines, &replacement);
     if (result == 0)
         result = replacement.commit(Flush::to_disk);
     if (result == 0)

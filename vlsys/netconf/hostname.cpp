@@ -38,8 +38,6 @@ static bool is_letter_or_digit(char c) {
 // A hyphen or dot only after a letter or digit, and no hyphen at the end.
 static bool has_good_characters(const char *name) {
     char before = '.';
-    if (*name == '\0')
-        return true;
     for (; *name != '\0'; before = *name++) {
         if (is_letter_or_digit(*name))
             continue;

@@ -4,6 +4,7 @@
 #include "core/log.h"
 #include "core/paths.h"
 #include "core/text.h"
+#include "netconf/ifcfg.h"
 #include "netconf/interfaces.h"
 
 #include <cstring>
@@ -95,16 +96,9 @@ int get_mode(const char *name, uint32_t *ipv4_mode, uint32_t *ipv6_mode) {
         *ipv4_mode = VLSYS_MODE_OFF;
         return 0;
     }
-    const Text path = format_text("%s%s", ifcfg_prefix, name);
-    if (!path) {
-        vlsys_log(LOG_ERR, "asprintf(\"%s%s\"): %m", ifcfg_prefix, name);
+    const File file = open_ifcfg("get_mode", name);
+    if (!file)
         return errno;
-    }
-    const File file(fopen(path.get(), "re"));
-    if (!file) {
-        vlsys_log(LOG_ERR, "%s: fopen(%s): %m", "get_mode", path.get());
-        return errno;
-    }
     Settings settings = read_settings(file.get());
     settings.fixed |= strcmp(name, "lo") == 0;
     *ipv4_mode = ipv4_mode_of(settings);
