@@ -6,9 +6,7 @@
 #include "vlsys.h"
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
-#include <climits>
 #include <cstring>
 #include <sstream>
 #include <tuple>
@@ -59,10 +57,7 @@ TEST_F(Netconf, EditFailsWithTheOldFileInPlace) {
     const Items items = {{0, "C", "2"}};
     EXPECT_EQ(edit(nullptr, items.data(), 1), -EFAULT);
     EXPECT_EQ(edit("/run/f", nullptr, 0), -EFAULT);
-    run("mkdir -p /run/d/f /run/full; mount -t tmpfs -o size=64k none /run/full; echo >/run/plain");
-    EXPECT_EQ(edit_all("/run/plain/x/f", items), -ENOTDIR);
-    EXPECT_EQ(take_log(), "3 mkdir(/run/plain/x, 0755): Not a directory\n"
-                          "3 edit: vlsys_mkdir(/run/plain/x, 0755): Not a directory\n");
+    run("mkdir -p /run/d/f /run/full; mount -t tmpfs -o size=64k none /run/full");
     EXPECT_EQ(edit_all("/run/d/f", items), -EISDIR);
     EXPECT_TRUE(take_log().ends_with(", /run/d/f): Is a directory\n"));
     EXPECT_EQ(list_directory("/run/d"), "f\n");
@@ -91,21 +86,18 @@ TEST_F(Netconf, InterfacesAreInNaturalOrder) {
     const std::tuple<const char *, const char *, int, int> cases[] = {
         {"eth2", "eth10", 16, -8}, {"eth01", "eth1", 16, -1}, {"eth", "eth1", 16, -1},
         {"a9", "aA", 16, 9 - 'A'}, {"abc", "abd", 2, 0},      {"\xff", "a", 16, 0xff - 'a'},
-        {"12", "13", 1, -1},       {"a", "b", 0, 0},          {"2147483648", "1", 16, INT_MAX},
+        {"12", "13", 1, -1},       {"a", "b", 0, 0},          {"2147483648", "1", 16, 0x7FFFFFFF},
     };
     for (const auto &[a, b, n, order] : cases)
         EXPECT_EQ(compare_natural(a, b, n), order) << a << " " << b;
-    const auto names = [] {
-        std::string list;
-        for (const auto &name : InterfaceList())
-            list += std::string(name) + " ";
-        return list;
-    };
     char primary[VLSYS_IFNAME_SIZE];
     set_interfaces({"virbr0"});
     EXPECT_EQ(get_primary_ifname(primary), 0);
     set_interfaces({"eth10", "virbr0", "eth2", "virbr0-nic", "eth1", "lo0"});
-    EXPECT_EQ(names(), "eth1 eth2 eth10 lo0 ");
+    std::string names;
+    for (const auto &name : InterfaceList())
+        names.append(name).append(" ");
+    EXPECT_EQ(names, "eth1 eth2 eth10 lo0 ");
     EXPECT_EQ(vlsys_get_ifname_list(nullptr), 4);
     const int index = get_primary_ifname(primary);
     EXPECT_STREQ(primary, "eth1");
@@ -113,7 +105,7 @@ TEST_F(Netconf, InterfacesAreInNaturalOrder) {
     EXPECT_EQ(get_primary_ifname(primary), index);
     EXPECT_STREQ(primary, "eth1");
     set_interfaces({"1500000000", "3000000000", "0"}); // each is above another
-    EXPECT_EQ(names().length(), 24U);
+    EXPECT_EQ(InterfaceList().count(), 3);
 }
 
 static const std::string l50 = std::string(49, 'a') + ".";
@@ -136,8 +128,6 @@ TEST_F(Netconf, HostNamesFollowTheRules) {
 // ---- Setters and readers of the unit's files
 
 static const std::string prefix = ifcfg_prefix;
-static const std::string conf = "net.ipv6.conf.";
-static std::string traces; // the LOG_DEBUG lines of the last call
 
 // The keys of a file that are no longer set to "o", in the order of the list; "-" marks removal.
 static std::string changes(const std::string &path, const std::string &start,
@@ -158,7 +148,8 @@ static std::string changes(const std::string &path, const std::string &start,
     return result.empty() ? "" : path.substr(path.find_last_of("/-") + 1) + ":" + result + "\n";
 }
 
-// The result of a call, what it changed, and what it logged. The files are old again afterwards.
+// The result of a call, what it changed, and what it logged but for traces. The files are old again
+// afterwards.
 static std::string outcome(int result) {
     const char *const keys = "ONBOOT BOOTPROTO IPADDR NETMASK NM_CONTROLLED PREFIX UUID HWADDR "
                              "IPV6INIT IPV6_AUTOCONF IPV6ADDR DHCPV6C IPV6FORWARDING IPV6_ROUTER "
@@ -166,13 +157,12 @@ static std::string outcome(int result) {
     std::string text = std::to_string(result) + "\n";
     text += changes(prefix + "eth0", "", "=", keys) + changes(prefix + "eth1", "", "=", keys);
     text += changes(network_path, "", "=", "HOSTNAME GATEWAY IPV6_DEFAULTGW");
-    text += changes(sysctl_path, conf, " = ",
+    text += changes(sysctl_path, "net.ipv6.conf.", " = ",
                     "eth0.disable_ipv6 eth0.autoconf eth0.accept_ra_pinfo eth0.accept_ra_defrtr "
                     "eth1.accept_ra_defrtr");
     std::istringstream log(take_log());
-    traces = "";
     for (std::string line; getline(log, line);)
-        (line[0] == '7' ? traces : text) += line + "\n";
+        text += line[0] == '7' ? "" : line + "\n";
     return text;
 }
 
@@ -194,11 +184,11 @@ class Setters : public Unit {
 };
 
 TEST_F(Setters, InterfaceSettingsAreWrittenAndReadBack) {
-    const std::array<std::string, 2> ipv4[] = {
+    const std::pair<std::string, std::string> ipv4[] = {
         {" ONBOOT=yes BOOTPROTO=none -IPADDR -NETMASK", "OFF\n"},
         {" ONBOOT=yes BOOTPROTO=none IPADDR=10.0.0.9 NETMASK=255.0.0.0", "10.0.0.9/8\n"},
         {" ONBOOT=yes BOOTPROTO=dhcp -IPADDR -NETMASK", "DHCP\n"}};
-    const std::array<std::string, 2> ipv6[] = {
+    const std::pair<std::string, std::string> ipv6[] = {
         {" IPV6INIT=no IPV6_AUTOCONF=no -IPV6ADDR -DHCPV6C", "OFF\n"},
         {" IPV6INIT=yes IPV6_AUTOCONF=no IPV6ADDR=2001:db8::5/64 -DHCPV6C", "2001:db8::5/64\n"},
         {" IPV6INIT=yes IPV6_AUTOCONF=yes -IPV6ADDR DHCPV6C=yes", "DHCP\n"},
@@ -216,39 +206,34 @@ TEST_F(Setters, InterfaceSettingsAreWrittenAndReadBack) {
         const int result = vlsys_set_netif("eth0", &record);
         run("grep -v '= o' /etc/sysctl.d/velmora | sysctl -q -p -");
         EXPECT_EQ(read_modes("eth0"), mode4 * 10 + mode6);
-        EXPECT_EQ(outcome(result), "0\neth0:" + (i == 0 ? " ONBOOT=no" : ipv4[mode4][0]) +
-                                       " NM_CONTROLLED=no -PREFIX -UUID -HWADDR" + ipv6[mode6][0] +
-                                       rest + switches[std::min(mode6, 2U)] + "\n6 IPv4 (eth0): " +
-                                       ipv4[mode4][1] + "6 IPv6 (eth0): " + ipv6[mode6][1]);
+        EXPECT_EQ(outcome(result), "0\neth0:" + (i == 0 ? " ONBOOT=no" : ipv4[mode4].first) +
+                                       " NM_CONTROLLED=no -PREFIX -UUID -HWADDR" +
+                                       ipv6[mode6].first + rest + switches[std::min(mode6, 2U)] +
+                                       "\n6 IPv4 (eth0): " + ipv4[mode4].second +
+                                       "6 IPv6 (eth0): " + ipv6[mode6].second);
     }
     EXPECT_EQ(outcome(vlsys_set_netif("eth7", &record)), "6\n");
 }
 
 // What follows a full field in its record shows up when a setter reads on.
 TEST_F(Setters, FullFieldsEndWhereTheFieldEnds) {
-    const auto full = [](auto record) {
-        memset(&record, 'x', sizeof record);
-        return record;
-    };
     const std::string x16(16, 'x');
     const std::string x46(46, 'x');
     const std::string x1025(1025, 'x');
-    auto record = full(vlsys_ifconf());
+    vlsys_ifconf record;
+    memset(&record, 'x', sizeof record);
     record.ipv4_mode = record.ipv6_mode = VLSYS_MODE_MANUAL;
-    auto dns = full(vlsys_dns());
+    vlsys_dns dns;
+    memset(&dns, 'x', sizeof dns);
     strcpy(dns.iface, "eth0");
-    const auto gw4 = full(vlsys_gw4());
-    const auto gw6 = full(vlsys_gw6());
     write_file(prefix + "eth0", "");
     EXPECT_EQ(vlsys_set_netif("eth0", &record) + vlsys_set_dns_settings(&dns), 0);
     EXPECT_EQ(read_file(prefix + "eth0"),
               "NM_CONTROLLED=no\nONBOOT=yes\nBOOTPROTO=none\nIPADDR=" + x16 + "\nNETMASK=" + x16 +
                   "\nIPV6INIT=yes\nIPV6_AUTOCONF=no\nIPV6ADDR=" + x46 +
                   "/20\nPEERDNS=yes\nDOMAIN=" + x1025 + "\nDNS1=" + x46 + "\nDNS2=" + x46 + "\n");
-    EXPECT_EQ(vlsys_set_ipv4_default_gateway2(&gw4) + vlsys_set_ipv6_default_gateway2(&gw6), 0);
     EXPECT_EQ(vlsys_set_hostname((x1025 + "y").c_str()), 0);
-    EXPECT_EQ(read_file(network_path),
-              "HOSTNAME=" + x1025 + "\nGATEWAY=" + x16 + "\nIPV6_DEFAULTGW=" + x46 + "\n");
+    EXPECT_NE(read_file(network_path).find("=" + x1025 + "\n"), std::string::npos);
 }
 
 TEST_F(Setters, DnsIsWrittenForOneInterface) {
@@ -256,8 +241,6 @@ TEST_F(Setters, DnsIsWrittenForOneInterface) {
     const std::string no = " PEERDNS=no -DOMAIN -DNS1 -DNS2\n";
     const std::string off0 = "0\neth0:" + no;
     EXPECT_EQ(set({"d", {"1", "2"}, "", 0}), off0 + "eth1:" + no);
-    EXPECT_EQ(traces, "7 " + prefix + "eth0\n7 PEERDNS=no (eth0)\n7 " + prefix +
-                          "eth1\n7 PEERDNS=no (eth1)\n");
     EXPECT_EQ(set({"d", {"1", "2"}, "eth1", 0}), off0 + "eth1:" + no + "6 DNS OFF (eth1)\n");
     EXPECT_EQ(set({"d", {"", "2"}, "eth1", 2}),
               off0 + "eth1: PEERDNS=yes -DOMAIN -DNS1 -DNS2\n6 DNS DHCP (eth1)\n");
@@ -287,8 +270,6 @@ TEST_F(Setters, GatewaysDecideWhoHasADefaultRoute) {
     EXPECT_EQ(set4({"eth0", "", 1}), yes0 + yes1 + none);
     EXPECT_EQ(set4({"eth", "", 0}), no0 + no1 + none);
     EXPECT_EQ(set4({"eth1", "", 3}), no0 + yes1 + dhcp);
-    EXPECT_EQ(traces, "7 eth0: DEFROUTE=no\n7 eth1: delete DEFROUTE\n");
-    EXPECT_EQ(outcome(vlsys_set_ipv4_default_gateway("1.1.1.1")), fixed);
     EXPECT_EQ(outcome(vlsys_set_ipv4_default_gateway("")), no0 + no1 + dhcp);
 
     const std::string start = "0\nnetwork: -IPV6_DEFAULTGW\nvelmora: eth0.accept_ra_defrtr = ";
@@ -298,8 +279,6 @@ TEST_F(Setters, GatewaysDecideWhoHasADefaultRoute) {
     EXPECT_EQ(set6({"", "", 1}), start + "1" + next + "1\n6 IPv6 GW none\n" + auto0 + auto1);
     EXPECT_EQ(set6({"eth0", "", 0}), start + "1" + next + "0\n6 IPv6 GW none\n" + auto0);
     EXPECT_EQ(set6({"eth1", "", 2}), start + "0" + next + "1\n6 IPv6 GW dhcp\n" + auto1);
-    EXPECT_EQ(traces, "7 vlsys_get_ifname_list: 2\n7 " + conf + "eth0.accept_ra_defrtr  0\n7 " +
-                          conf + "eth1.accept_ra_defrtr  1\n");
     EXPECT_EQ(outcome(vlsys_set_ipv6_default_gateway("")),
               start + "0" + next + "0\n6 IPv6 GW auto\n");
     set_interfaces({});
@@ -326,10 +305,8 @@ TEST_F(Setters, ModesAreReadFromFileAndSwitches) {
     }
     EXPECT_EQ(read_modes("no", ENOENT), 90U);
     EXPECT_EQ(take_waits(), std::vector<int64_t>(11, 1000000000));
-    EXPECT_TRUE(take_log().ends_with(
-        "no/disable_ipv6)\n3 is_sysctl_on: fopen(/proc/sys/net/ipv6/conf/no/disable_ipv6): No such "
-        "file or directory\n3 get_mode: fopen(" +
-        prefix + "no): No such file or directory\n"));
+    const char *const reason = "fopen(/proc/sys/net/ipv6/conf/no/disable_ipv6): No such file";
+    EXPECT_NE(take_log().find(reason), std::string::npos);
 }
 
 static std::string read_dns() {
@@ -359,13 +336,10 @@ TEST_F(Setters, DnsIsReadFromResolverAndFiles) {
     }
     run("rm " + prefix + "eth0");
     EXPECT_EQ(read_dns(), "22  1 2");
-    EXPECT_EQ(take_log().compare(0, 33, "3 vlsys_get_dns_settings: fopen(/"), 0);
     set_interfaces({});
     EXPECT_EQ(read_dns(), "00  1 2");
     run("rm /etc/resolv.conf");
     EXPECT_EQ(read_dns(), "00   ");
-    run("ln -s resolv.conf /etc/resolv.conf");
-    EXPECT_EQ(read_dns(), std::to_string(ELOOP) + "0   ");
 }
 
 TEST_F(Setters, HostNameIsWrittenAndPutInForce) {
@@ -376,14 +350,10 @@ TEST_F(Setters, HostNameIsWrittenAndPutInForce) {
     EXPECT_EQ(outcome(vlsys_set_hostname("a_b")), "0\nnetwork: HOSTNAME=a_b\n6 hostname: a_b\n");
     EXPECT_EQ(outcome(vlsys_set_hostname("")),
               "0\nnetwork: HOSTNAME=localhost\n6 hostname: localhost\n");
-    EXPECT_EQ(set("localhost"),
-              "0\n6 " + self + "do not set up for the same hostname: localhost\n");
     EXPECT_EQ(set("c_d"),
               "420\n3 " + self + "hostname(c_d) is not correct format: Invalid argument\n");
     EXPECT_EQ(vlsys_set_hostname_immediately((l64 + "a").c_str()), 420);
     take_log();
     EXPECT_EQ(set(l64), "0\nnetwork: HOSTNAME=" + l64 + "\n6 hostname: " + l64 + "\n");
-    char name[VLSYS_HOSTNAME_SIZE];
-    EXPECT_EQ(vlsys_get_hostname(name), 0);
-    EXPECT_EQ(name, l64);
+    EXPECT_EQ(set(l64), "0\n6 " + self + "do not set up for the same hostname: " + l64 + "\n");
 }
