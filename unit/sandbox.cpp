@@ -56,7 +56,7 @@ static void become_root() {
     const std::string uid = std::to_string(geteuid());
     const std::string gid = std::to_string(getegid());
     check(unshare(CLONE_NEWUSER | CLONE_NEWNS | CLONE_NEWNET | CLONE_NEWUTS | CLONE_NEWPID) == 0,
-          "no namespaces for this user (unshare)");
+          "unshare (are user namespaces allowed here? they are not in a chroot)");
     write("/proc/self/setgroups", "deny");
     write("/proc/self/uid_map", "0 " + uid + " 1");
     write("/proc/self/gid_map", "0 " + gid + " 1");

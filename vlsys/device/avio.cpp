@@ -4,6 +4,7 @@
 #include "core/log.h"
 #include "core/owners.h"
 #include "core/paths.h"
+#include "core/text.h"
 
 #include <cstring>
 #include <string_view>
@@ -47,7 +48,7 @@ struct StatusLine {
 
 static int find_board(const char *device) {
     for (int i = 0; i < board_count; i++)
-        if (std::string_view(device).starts_with(boards[i].device))
+        if (starts_with(device, boards[i].device))
             return i;
     vlsys_log(LOG_ERR, "unknown device id: %s", device);
     return unknown_board;
@@ -64,12 +65,12 @@ static bool next_line(FILE *file, std::string_view register_prefix, StatusLine *
     char line[1024];
     while (read_line(file, line, sizeof line)) {
         const std::string_view text = line;
-        result->is_header = text.starts_with(header_prefix);
+        result->is_header = starts_with(text, header_prefix);
         if (result->is_header) {
             result->board = find_board(line + header_prefix.size());
             return true;
         }
-        if (text.starts_with(register_prefix)) {
+        if (starts_with(text, register_prefix)) {
             result->value = parse_register(line + register_prefix.size());
             return true;
         }

@@ -107,9 +107,9 @@ static void read_resolver(FILE *file, vlsys_dns *dns) {
         const char *value = strtok_r(nullptr, " \t\n", &rest);
         if (!value)
             value = "";
-        if (keyword.starts_with("domain") || keyword.starts_with("search"))
+        if (starts_with(keyword, "domain") || starts_with(keyword, "search"))
             vlsys_strlcpy(dns->domain, value, sizeof dns->domain);
-        else if (keyword.starts_with("nameserver") && servers < VLSYS_DNS_COUNT)
+        else if (starts_with(keyword, "nameserver") && servers < VLSYS_DNS_COUNT)
             vlsys_strlcpy(dns->server[servers++], value, VLSYS_ADDR6_SIZE);
     }
 }

@@ -2,6 +2,7 @@
 
 #include "core/log.h"
 #include "core/replacement.h"
+#include "core/text.h"
 
 #include <cstring>
 #include <string_view>
@@ -91,7 +92,7 @@ int WorkingList::build(std::span<const edit_item> items) {
 
 const WorkingList::Entry *WorkingList::take(std::string_view line) {
     for (Entry *entry = entries_.get(); entry->line; ++entry) {
-        if (!entry->used && line.starts_with(std::string_view(entry->line, entry->match))) {
+        if (!entry->used && starts_with(line, std::string_view(entry->line, entry->match))) {
             entry->used = true;
             return entry;
         }

@@ -99,7 +99,8 @@ static Text make_zone_line(const char *zone) {
 // The piece stays the caller's, for the messages of a later commit.
 static int rewrite_clock(FILE *clock, const char *path, std::string_view zone_line, Piece *piece,
                          Replacement *replacement) {
-    const std::string_view cut_line = zone_line.substr(0, sizeof piece->bytes - 1);
+    const std::string_view cut_line(zone_line.data(),
+                                    std::min(zone_line.size(), sizeof piece->bytes - 1));
     bool has_zone = false;
     bool in_line = false;
     while (read_piece(clock, piece)) {
@@ -153,13 +154,14 @@ static int set_clock_zone(const char *zone) {
 static size_t read_zone(FILE *clock, char *zone, size_t size) {
     static constexpr std::string_view key = "ZONE=\"";
     for (Piece piece; read_piece(clock, &piece);) {
-        const size_t at = piece.text().find(key);
+        std::string_view value = piece.text();
+        const size_t at = value.find(key);
         if (at == std::string_view::npos)
             continue;
-        char *const value = piece.bytes + at + key.size();
-        const std::string_view rest = piece.text().substr(at + key.size());
-        value[std::min(rest.rfind('"'), rest.size())] = '\0';
-        return vlsys_strlcpy(zone, value, size);
+        value.remove_prefix(at + key.size());
+        char *const start = piece.bytes + at + key.size();
+        start[std::min(value.rfind('"'), value.size())] = '\0';
+        return vlsys_strlcpy(zone, start, size);
     }
     return 0;
 }
