@@ -382,6 +382,99 @@ VLSYS_API int vlsys_get_hostname(char *name);
  */
 VLSYS_API int vlsys_set_hostname_immediately(const char *name);
 
+/* ---- Network state --------------------------------------------------------------------------- */
+
+/*
+ * Reads the present state of an interface into the record. Link, addresses and flags are the
+ * kernel's; ipv4_mode and ipv6_mode are what /etc/sysconfig/network-scripts/ifcfg-<ifname> and the
+ * switches disable_ipv6 and autoconf in /proc/sys/net/ipv6/conf/<ifname> set.
+ *
+ * - Addresses are taken in the kernel's order. Of several IPv4 addresses (aliases such as eth0:1)
+ *   the last one stays. broadaddr is the kernel's when the interface can broadcast; of an address
+ *   without one it is the address itself.
+ * - addr6: a link-local address goes to entry 1, a site-local one to entry 0. Any other goes to
+ *   the first of the entries 0, 2 and 3 that is empty, or else replaces entry 3.
+ * - An interface is told by the beginning of its addresses' names: "eth1" shows those of eth10 too.
+ * - up, has_ipv6 and addr6 are cleared first; the other fields of what the interface does not have
+ *   stay as they are, so give a record of zeros.
+ *
+ * Returns 0; 14 (EFAULT) for a null argument and 6 (ENXIO) when there is no such interface, both
+ * silent and with nothing written; the errno value of getifaddrs; the errno value or negative
+ * resolver code of an address that could not be converted, with the fields up to it filled, but not
+ * name, index and the modes; the positive errno of an interface file that cannot be read, with all
+ * filled but ipv4_mode. An interface that vanishes meanwhile leaves name and index unwritten.
+ * Reads the kernel's list once; waits 11 seconds for each switch file that is missing.
+ */
+VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
+
+/*
+ * Reads the IPv6 default gateway in force: the first route to :: in /proc/net/ipv6_route that is up
+ * and has a gateway. `addr` is its address, with "%interface" when it is link-local, and `iface`
+ * its interface. The mode is Manual for a route that the kernel counts one reference to, else Auto.
+ * Without such a route the record is all empty (Off).
+ *
+ * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the
+ * table when it cannot be opened, with the record as it was; the errno value or negative resolver
+ * code of an address that could not be converted, with the record Off.
+ */
+VLSYS_API int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw);
+
+/*
+ * Reads the IPv4 default gateway in force, and how it is configured. `addr` and `iface` are those
+ * of the first route to 0.0.0.0/0 in /proc/net/route ("0.0.0.0" for a route without a gateway),
+ * empty when there is none. The mode is Manual when <root>/etc/sysconfig/network has a line that
+ * begins with "GATEWAY="; else DHCP when <root>/etc/sysconfig/network-scripts/ifcfg-<name> of some
+ * interface has a line that begins with "BOOTPROTO=dhcp" and none with "DEFROUTE=no"; else Off.
+ *
+ * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of a
+ * file that cannot be opened: of the table with the record as it was, of another with the gateway
+ * read, and the mode as far as it was found; the errno value or negative resolver code of an
+ * address that could not be converted, with `addr` and `iface` empty and the mode found.
+ */
+VLSYS_API int vlsys_get_ipv4_default_gateway2(vlsys_gw4 *gw);
+
+/*
+ * The address alone, in a buffer of VLSYS_ADDR6_SIZE or VLSYS_ADDR4_SIZE bytes; empty when there is
+ * no gateway, and on failure. They return what the reader of the record returns.
+ */
+VLSYS_API int vlsys_get_ipv6_default_gateway(char *text);
+VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
+
+/* ---- Network restart ------------------------------------------------------------------------- */
+
+/*
+ * Puts into force what the setters wrote, and logs the state that comes of it. In this order: sets
+ * the running host name to the HOSTNAME of /etc/sysconfig/network (empty when there is none, or no
+ * file); makes sure that vlsys_get_dns_settings can read; removes /etc/resolv.conf, which the
+ * network scripts write anew; runs "service network restart" with vlsys_system; reports.
+ *
+ * Returns
+ *   the exit code of the restart command, 0 to 255, or 256 when it did not exit normally;
+ *   a positive errno when the DNS settings cannot be read, with only the host name set;
+ *   the negated errno when the host name cannot be set, with nothing else done;
+ *   -1 when the restart command could not be run, with no report.
+ * A negated errno of 1 (EPERM) is also -1; a positive errno is told from an exit code by the log.
+ * Failures in the report are logged and change nothing.
+ *
+ * The report, at LOG_INFO, shows the first two interfaces of vlsys_get_ifname_list; each line has
+ * at most 159 characters, the rest is cut. The modes are those of vlsys_address_check2.
+ *   vlsys_network_restart: exited (service network restart), status: 0
+ *   hostname: rhx416-41600123
+ *   mode: MD_AM_M4_
+ *   eth0: link up, MAC: 02-00-00-00-00-01
+ *   192.168.1.10/24
+ *   eth1: no carrier, MAC: 02-00-00-00-00-02
+ *   192.168.2.20/24, fd00::20/64, fe80::2%eth1/64
+ *   gw4 192.168.1.1 (eth0) [static], gw6 [off]
+ *   DNS domain: example.com  server: 192.168.1.1
+ * The second line of an interface has IPv6 addresses alone when IPv4 is not up, and is left out
+ * when there are none either. A gateway's mode is "static", "dhcp", "auto" or "off".
+ *
+ * Blocks until the command has ended, and after exit code 0 up to 10 seconds more for each shown
+ * interface that is set to IPv6 and has no IPv6 address yet (each second at LOG_DEBUG).
+ */
+VLSYS_API int vlsys_network_restart(void);
+
 /* ---- Processes ------------------------------------------------------------------------------- */
 
 /*
