@@ -127,7 +127,7 @@ static void make_networks() {
 }
 
 void enter_namespaces() {
-    setenv("PATH", "/usr/sbin:/usr/bin:/sbin:/bin", 1);
+    setenv("PATH", UNIT_PROGRAMS ":/usr/sbin:/usr/bin:/sbin:/bin", 1);
     become_root();
     fork_and_wait(); // into the PID namespace, as its init
     fork_and_wait(); // an init ignores the signals that end any other process
@@ -160,7 +160,8 @@ void make_unit_files(const char *kind_name) {
     if (!kind)
         fail(kind_name, "no such kind of unit");
     std::error_code error;
-    for (const char *path : {"/etc/sysconfig", "/etc/sysctl.d", "/etc/localtime"})
+    for (const char *path :
+         {"/etc/sysconfig", "/etc/sysctl.d", "/etc/localtime", "/etc/resolv.conf"})
         fs::remove_all(path, error);
     copy_files();
     check(symlink("/usr/share/zoneinfo/UTC", "/etc/localtime") == 0, "/etc/localtime");

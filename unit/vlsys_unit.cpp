@@ -4,7 +4,6 @@
 #include "unit/sandbox.h"
 
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <unistd.h>
 
@@ -16,7 +15,6 @@ static int list_kinds() {
 
 static void make_unit(const unit::Kind &kind) {
     unit::enter_namespaces();
-    setenv("PATH", (std::string(UNIT_PROGRAMS ":") + getenv("PATH")).c_str(), 1);
     unit::make_unit_files(kind.name);
     for (const char *interface : {"eth0", "eth1", "eth2", "eth10", "virbr0"})
         unit::add_interface(interface);

@@ -410,7 +410,8 @@ VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
 /*
  * Reads the IPv6 default gateway in force: the first route to :: in /proc/net/ipv6_route that is up
  * and has a gateway. `addr` is its address, with "%interface" when it is link-local, and `iface`
- * its interface. The mode is Manual for a route that the kernel counts one reference to, else Auto.
+ * its interface. The mode goes by the kernel's count of references to the route: Manual for exactly
+ * one, else Auto. (Recent kernels count one for a learnt route too, and one more for a use.)
  * Without such a route the record is all empty (Off).
  *
  * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the

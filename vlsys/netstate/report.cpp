@@ -24,14 +24,7 @@ namespace {
 // What does not fit into the line is dropped.
 class Line {
   public:
-    [[gnu::format(printf, 2, 3)]] void append(const char *format, ...) {
-        va_list arguments;
-        va_start(arguments, format);
-        const int length = vsnprintf(text_ + length_, sizeof text_ - length_, format, arguments);
-        va_end(arguments);
-        if (length > 0)
-            length_ = std::min(length_ + static_cast<size_t>(length), sizeof text_ - 1);
-    }
+    [[gnu::format(printf, 2, 3)]] void append(const char *format, ...);
     bool is_empty() const { return length_ == 0; }
     void log() const { vlsys_log(LOG_INFO, "%s", text_); }
 
@@ -41,6 +34,15 @@ class Line {
 };
 
 } // namespace
+
+void Line::append(const char *format, ...) {
+    va_list arguments;
+    va_start(arguments, format);
+    const int length = vsnprintf(text_ + length_, sizeof text_ - length_, format, arguments);
+    va_end(arguments);
+    if (length > 0)
+        length_ = std::min(length_ + static_cast<size_t>(length), sizeof text_ - 1);
+}
 
 static void query(const char *name, int exit_code, vlsys_ifconf &nif) {
     for (int tries = 1; tries <= ipv6_tries; tries++) {

@@ -85,7 +85,7 @@ int read_ipv6_gateway(FILE *table, vlsys_gw6 *gw) {
             }
             vlsys_strlcpy(gw->iface, fields.text[device], sizeof gw->iface);
         }
-        // The kernel holds a route of its own making more than once.
+        // The appliance's kernel holds a learnt route more than once; recent ones count uses.
         gw->mode = fields.hex(references, 0) == 1 ? VLSYS_MODE_MANUAL : VLSYS_MODE_AUTO;
         return 0;
     }
