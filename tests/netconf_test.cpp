@@ -327,7 +327,6 @@ TEST_F(Setters, DnsIsReadFromResolverAndFiles) {
         {"02  1 2", "", "",
          "nameserver\n nameserver 1\nnameservers 2\nnameserver 3\n \ndomain d\n"},
     };
-    run("rm /etc/resolv.conf");
     for (const auto &[expected, eth0, eth1, resolver] : cases) {
         write_file(resolv_path, resolver);
         write_file(prefix + "eth0", eth0);
