@@ -3,6 +3,7 @@
 #include "core/lines.h"
 #include "core/log.h"
 #include "core/paths.h"
+#include "core/text.h"
 #include "netconf/interfaces.h"
 #include "netstate/address.h"
 
@@ -117,7 +118,7 @@ static bool names_gateway(FILE *network) {
     bool found = false;
     char line[line_size];
     while (read_line(network, line, sizeof line))
-        found |= std::string_view(line).starts_with("GATEWAY=");
+        found |= starts_with(line, "GATEWAY=");
     return found;
 }
 
@@ -126,8 +127,8 @@ static bool learns_gateway(FILE *ifcfg) {
     bool refused = false;
     char line[line_size];
     while (read_line(ifcfg, line, sizeof line)) {
-        dhcp |= std::string_view(line).starts_with("BOOTPROTO=dhcp");
-        refused |= std::string_view(line).starts_with("DEFROUTE=no");
+        dhcp |= starts_with(line, "BOOTPROTO=dhcp");
+        refused |= starts_with(line, "DEFROUTE=no");
     }
     return dhcp && !refused;
 }
