@@ -95,6 +95,7 @@ TEST_F(Netstate, InterfaceQueryFails) {
     before_getifaddrs = [] { set_interfaces({}); };
     EXPECT_EQ(vlsys_get_netif("eth0", &(nif = {})), ENOENT);
     EXPECT_EQ(show(nif), " 0  0 //0/ 0 /0 /0 /0 /0");
+    before_getifaddrs = [] {};
 }
 
 template <class Gateway>
@@ -140,6 +141,7 @@ TEST_F(Netstate, GatewaysAreReadFromKernelAndFiles) {
     setenv("VL_ROOT", "/run", 1);
     vlsys_exit();
     vlsys_init();
+    unsetenv("VL_ROOT");
     vlsys_gw4 gw4 = {};
     vlsys_gw6 gw6 = {};
     const std::string prepare = "mkdir -p /run" + scripts + "; cd /run" + scripts + "/..; "
