@@ -91,7 +91,8 @@ void set_interfaces(const std::vector<std::string> &names) {
 
 static std::mutex log_mutex;
 static std::condition_variable log_arrived;
-static std::vector<std::string> log_datagrams;
+// Never destroyed: the collector may be adding to it while the process exits.
+static auto &log_datagrams = *new std::vector<std::string>;
 static int log_marker = -1; // connected to the collector for good, even when /dev/log is unlinked
 
 static const char marker[] = "end of what was logged so far";
