@@ -27,6 +27,20 @@ static char hostname[VLSYS_HOSTNAME_SIZE] = "studio-1";
 
 static const int count = sizeof interfaces / sizeof *interfaces;
 
+/* Other faults are of the setting as a whole, and their code's position says nothing. */
+static int is_of_one_interface(int fault) {
+    switch (VLSYS_CHECK_FIELD(fault)) {
+    case VLSYS_CHECK_FIELD_IPV4_ADDR:
+    case VLSYS_CHECK_FIELD_IPV4_NETMASK:
+    case VLSYS_CHECK_FIELD_IPV6_ADDR:
+    case VLSYS_CHECK_FIELD_IPV6_PREFIX:
+    case VLSYS_CHECK_FIELD_IFNAME:
+        return VLSYS_CHECK_KIND(fault) != VLSYS_CHECK_KIND_OVERLAP;
+    default:
+        return 0;
+    }
+}
+
 static void print_fault(int fault) {
     static const char *const fields[] = {
         [VLSYS_CHECK_FIELD_IPV4_ADDR] = "IPv4 address",
@@ -51,14 +65,16 @@ static void print_fault(int fault) {
         [VLSYS_CHECK_KIND_PREFIX] = "is out of range",
         [VLSYS_CHECK_KIND_RANGE] = "is not allowed here",
         [VLSYS_CHECK_KIND_NO_IFACE] = "names no interface",
-        [VLSYS_CHECK_KIND_OVERLAP] = "is in another interface's subnet",
+        [VLSYS_CHECK_KIND_OVERLAP] = "is in the subnet of another",
         [VLSYS_CHECK_KIND_MODE] = "does not go with the interfaces' modes",
     };
-    if (VLSYS_CHECK_IS_CODE(fault))
-        printf("%s: the %s %s\n", interfaces[VLSYS_CHECK_POSITION(fault)].name,
-               fields[VLSYS_CHECK_FIELD(fault)], kinds[VLSYS_CHECK_KIND(fault)]);
-    else
+    if (!VLSYS_CHECK_IS_CODE(fault)) {
         printf("the setting cannot be checked: %d\n", fault);
+        return;
+    }
+    if (is_of_one_interface(fault))
+        printf("%s: ", interfaces[VLSYS_CHECK_POSITION(fault)].name);
+    printf("the %s %s\n", fields[VLSYS_CHECK_FIELD(fault)], kinds[VLSYS_CHECK_KIND(fault)]);
 }
 
 static int write_setting(void) {

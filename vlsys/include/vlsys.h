@@ -453,9 +453,10 @@ VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
  *   the exit code of the restart command, 0 to 255, or 256 when it did not exit normally;
  *   a positive errno when the DNS settings cannot be read, with only the host name set;
  *   the negated errno when the host name cannot be set, with nothing else done;
- *   -1 when the restart command could not be run, with no report.
+ *   a negative result of vlsys_system when the restart command could not be run, with no report.
  * A negated errno of 1 (EPERM) is also -1; a positive errno is told from an exit code by the log.
- * Failures in the report are logged and change nothing.
+ * Failures in the report are logged and change nothing; nor does /etc/resolv.conf that cannot be
+ * removed, logged at LOG_WARNING.
  *
  * The report, at LOG_INFO, shows the first two interfaces of vlsys_get_ifname_list; each line has
  * at most 159 characters, the rest is cut. The modes are those of vlsys_address_check2.
@@ -472,7 +473,8 @@ VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
  * when there are none either. A gateway's mode is "static", "dhcp", "auto" or "off".
  *
  * Blocks until the command has ended, and after exit code 0 up to 10 seconds more for each shown
- * interface that is set to IPv6 and has no IPv6 address yet (each second at LOG_DEBUG).
+ * interface that is set to IPv6 and has no IPv6 address yet (each second at LOG_DEBUG); each query
+ * of an interface can block as long as vlsys_get_netif.
  */
 VLSYS_API int vlsys_network_restart(void);
 

@@ -47,7 +47,7 @@ static File open_or_log(const char *path) {
     return file;
 }
 
-// 32 hexadecimal digits; digits that are missing at the end count as 0.
+// 32 hexadecimal digits; a group of eight that is missing counts as 0.
 static in6_addr parse_next_hop(const char *field) {
     char digits[33] = {};
     vlsys_strlcpy(digits, field, sizeof digits);

@@ -155,7 +155,8 @@ int vlsys_surrogate_connect(int quiet, const char *service) {
         vlsys_log(LOG_ERR, "%s: %m", "socket");
         return -1;
     }
-    if (connect(connection.get(), address->ai_addr, address->ai_addrlen) != 0) {
+    // Called again after a signal, connect waits on for the same connection.
+    if (TEMP_FAILURE_RETRY(connect(connection.get(), address->ai_addr, address->ai_addrlen)) != 0) {
         if (quiet && errno == ECONNREFUSED)
             return 0;
         vlsys_log(LOG_ERR, "%s: %m", "connect");
