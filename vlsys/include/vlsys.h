@@ -729,7 +729,7 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 #define VLSYS_CHECK_FIELD_IFNAME 11
 
 /* Kinds of fault. */
-#define VLSYS_CHECK_KIND_INVALID 1     /* missing, no valid address, or link-local without scope */
+#define VLSYS_CHECK_KIND_INVALID 1     /* missing, no valid address or netmask length, no scope */
 #define VLSYS_CHECK_KIND_NETMASK 2     /* netmask bits not contiguous */
 #define VLSYS_CHECK_KIND_UNREACHABLE 3 /* outside every subnet, or of a family that is Off */
 #define VLSYS_CHECK_KIND_SYNTAX 4      /* host or domain name not well-formed */
@@ -769,8 +769,8 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * resolver code of a failed address conversion; that of broadaddr alone does not stop the checks.
  * Logs the modes at LOG_INFO at the start and when all is well, and each fault at LOG_ERR. Silent:
  * null arguments, an interface that does not exist, an IPv6 prefix length above 128, an address of
- * a range that its field does not allow, a link-local address without scope, a malformed name and
- * a missing server[0].
+ * a range that its field does not allow, a link-local address without scope, a name with a
+ * misplaced character (one that is too long is logged) and a missing server[0].
  * Asks the kernel for interface names only; no name is looked up, nothing blocks.
  */
 VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,

@@ -1,7 +1,7 @@
 // Address texts to socket addresses and back, numeric only: no name is ever looked up.
 //
-// The checks return 0, an errno value (EFAULT for a null argument, EINVAL for a field code without
-// a field that holds an address), a negative resolver code, or the field code with
+// The checks return 0, an errno value (EFAULT for a null argument, EINVAL for a field code outside
+// fields 1 to 10), a negative resolver code, or the field code with
 // VLSYS_CHECK_KIND_INVALID or VLSYS_CHECK_KIND_RANGE in it. The latter is silent, and so is a
 // link-local IPv6 address without its "%interface"; everything else is logged under the field's
 // label. On success the text is rewritten in canonical form; on failure it is left as it was, but

@@ -11,8 +11,8 @@
 
 namespace vlsys {
 
-// `conversion`, here and below, is the result of the last address conversion. It is not a fault
-// only when the broadcast address has no text.
+// `conversion`, here and below, is the result of the last address conversion; it is non-zero
+// without being a fault only when the broadcast address has no text.
 static int check_ipv4(vlsys_ifconf &nif, char *gw4, Subnet4 &subnet, int &conversion) {
     const bool is_static = nif.ipv4_mode == VLSYS_MODE_MANUAL;
     if (is_static) {
