@@ -81,19 +81,21 @@ TEST_F(Netstate, InterfaceStateIsTheKernels) {
 TEST_F(Netstate, InterfaceQueryFails) {
     set_fixed_interfaces({"eth0"});
     vlsys_ifconf nif = {};
-    nif.up = 1;
-    vlsys_strlcpy(nif.addr6[0].addr, "stale", VLSYS_ADDR6_SIZE);
+    nif.up = nif.has_ipv6 = 1;
+    vlsys_strlcpy(nif.addr6[3].addr, "stale", VLSYS_ADDR6_SIZE);
     EXPECT_EQ(vlsys_get_netif(nullptr, &nif) + vlsys_get_netif("eth0", nullptr), 2 * EFAULT);
     EXPECT_EQ(vlsys_get_netif("eth", &nif), ENXIO);
     before_getifaddrs = [] { errno = ENOMEM; };
     EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOMEM);
     EXPECT_EQ(take_log(), "3 getifaddrs: Cannot allocate memory\n");
-    EXPECT_EQ(show(nif), " 0  1 //0/ 0 stale/0 /0 /0 /0");
+    EXPECT_EQ(show(nif), " 0  1 //0/ 1 /0 /0 /0 stale/0");
     before_getifaddrs = [] { unlink((scripts + "eth0").c_str()); };
     EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOENT);
     EXPECT_EQ(show(nif), "eth0 1 02-00-00-00-00-01 0 //0/ 1 /0 fe80::ff:fe00:1%eth0/64link /0 /0");
     before_getifaddrs = [] { set_interfaces({}); };
-    EXPECT_EQ(vlsys_get_netif("eth0", &(nif = {})), ENOENT);
+    nif = {};
+    nif.has_ipv6 = 1;
+    EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOENT);
     EXPECT_EQ(show(nif), " 0  0 //0/ 0 /0 /0 /0 /0");
     before_getifaddrs = [] {};
 }
@@ -223,6 +225,7 @@ TEST_F(Netstate, SettingInForceIsTheSettingWritten) {
         if (VLSYS_CHECK_IS_CODE(result))
             continue; // DNS without a family that carries it
         restarts++;
+        EXPECT_TRUE(take_waits().empty() || mode6 != 0); // IPv6 Off is queried once
         EXPECT_EQ(result, 0);
         std::string modes = log.substr(log.find(" mode: "), 16); // as the validator names them
         modes[12] = mode6 ? 'M' : '_'; // the kernel counts one reference to a route not in use

@@ -119,6 +119,15 @@ TEST_F(Validate, OneInterface) {
         v4=1 a=192.168.0.300                   | 111 | | 3 IPv4 address: 192.168.0.300: Name or service not known
         v4=1 a=0300.0250.0.0010                | 0   | a=192.168.0.8
         v4=1 a=224.0.0.1                       | 118
+        v4=1 a=127.255.0.1                     | 118
+        v4=1 a=0.0.0.1                         | 0   | bcast=0.0.0.255
+        v4=1 a=192.168.0.0                     | 115 | | 3 IP address is the same as network address: 192.168.0.0
+        v6=2 dns=2                             | 0
+        v4=5 dns=2                             | 0   | dns=0 | 4 A setup of DNS was set to DHCP although neither of IPv4 and IPv6 of the setup was DHCP. DNS setting is fallback to OFF.
+        v6=1 a6=3fff::1                        | 0
+        v6=3 gw6=x                             | 191 | | 3 IPv6 default gateway: x: Name or service not known
+        v4=2 dns=1 s0=x                        | 151 | | 3 DNS primary server: x: Name or service not known
+        v4=1 fail=3 dns=1 s0=192.168.0.1       | 0   | | 3 broadaddr: getnameinfo: Temporary failure in name resolution
         v4=1 fail=3                            | -3  | | 3 broadaddr: getnameinfo: Temporary failure in name resolution
         v4=1 fail=3 gw4=192.168.0.1            | 0   | | 3 broadaddr: getnameinfo: Temporary failure in name resolution
         v4=1 fail=3 v6=1                       | 0   | | 3 broadaddr: getnameinfo: Temporary failure in name resolution
@@ -167,6 +176,10 @@ TEST_F(Validate, SeveralInterfaces) {
         v4=2 gw4mode=1 gw4if=eth0 gw6mode=4    | 0   | gw4mode=0 gw4if= gw6mode=0
         v4=2 gw4mode=2                         | 131
         v4=1 gw4mode=2 gw4if=eth0              | 13b
+        1.v6=1 1.len6=129                      | 287
+        gw4mode=2 gw4if=eth0                   | 13b
+        gw6=fd00::1 gw6if=eth0 gw6mode=4       | 0   | gw6= gw6if= gw6mode=0
+        v4=1 1.v4=1 1.len=16 1.a=192.168.9.9   | 11a | 1.mask=255.255.0.0 1.bcast=192.168.255.255 | 6 start checking: mode: MM_______; 7 netmask: 24 -> 0xffffff00; 7 netmask: 16 -> 0xffff0000; 7 (c0a8000a & ffff0000) == c0a80000; 3 192.168.0.10/24 and 192.168.9.9/16 have overlapped; 6 vlsys_address_check2: NG (0x11a)
         gw4mode=2 gw4if=eth7 gw6mode=3 gw6if=eth7 | 0
         v6=1 gw6mode=1 gw6=fe80:0000:0000:0000:0000:0000:0000:0001%000001 | 0 | gw6=fe80::1%lo
         v4=2 v6=1 gw6mode=2 gw6if=eth0         | 19b

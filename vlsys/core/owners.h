@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
+#include <netdb.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -41,6 +42,11 @@ struct CloseFile {
     }
 };
 using File = std::unique_ptr<FILE, CloseFile>;
+
+struct FreeAddresses {
+    void operator()(addrinfo *list) const { freeaddrinfo(list); }
+};
+using AddressList = std::unique_ptr<addrinfo, FreeAddresses>; // from getaddrinfo
 
 class Fd {
   public:

@@ -759,8 +759,11 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  *   family is.
  * - DNS Manual: the domain is empty or well-formed. server[0] is given; it and server[1] become
  *   canonical, a repeated server[1] is emptied. A server belongs to a family that is on; one of a
- *   Manual family lies in its subnet or has a gateway to go through, and has no address whose host
- *   bits are all zero or that is the broadcast address. server[2] is not looked at.
+ *   Manual family lies in its subnet or has a gateway to go through. In IPv4 its host bits are not
+ *   all zero and it is not the broadcast address (a netmask of 255.255.255.255 has neither rule);
+ * in IPv6 it is not the network address. server[2] is not looked at. In the rules for DNS, and
+ * throughout vlsys_address_check2, only VLSYS_MODE_MANUAL is Manual and only VLSYS_MODE_DHCP is
+ * DHCP.
  * - dns->iface becomes the interface, whatever the DNS mode.
  * - The host name is well-formed and at most 64 characters long; an empty one becomes "localhost",
  *   with a warning.
@@ -770,7 +773,8 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * Logs the modes at LOG_INFO at the start and when all is well, and each fault at LOG_ERR. Silent:
  * null arguments, an interface that does not exist, an IPv6 prefix length above 128, an address of
  * a range that its field does not allow, a link-local address without scope, a name with a
- * misplaced character (one that is too long is logged) and a missing server[0].
+ * misplaced character (one that is too long is logged) and a missing server[0]. A netmask made of
+ * a prefix length is logged at LOG_DEBUG.
  * Asks the kernel for interface names only; no name is looked up, nothing blocks.
  */
 VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,
@@ -810,7 +814,9 @@ VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys
  * Logs at LOG_INFO the modes in one word ("MD__M_M4_": the IPv4 modes of the first two interfaces,
  * their IPv6 modes, IPv4 and IPv6 gateway, DNS and the families of its first two servers; a learnt
  * gateway is "0" or "1" for the interface it names, else "!") and the result, "NG (<code>)" or
- * "OK"; values on the way at LOG_DEBUG.
+ * "OK"; values on the way, and an interface that does not exist, at LOG_DEBUG. Silent beyond the
+ * faults of vlsys_address_check: a netmask length outside 8 to 30, a learnt gateway without an
+ * interface, and a gateway that the interfaces' modes do not support.
  */
 VLSYS_API int vlsys_address_check2(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *gw6,
                                    vlsys_dns *dns, char *hostname);

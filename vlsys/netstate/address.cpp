@@ -1,6 +1,7 @@
 #include "netstate/address.h"
 
 #include "core/log.h"
+#include "core/owners.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -25,10 +26,6 @@ static constexpr const char *field_labels[] = {
 };
 
 static constexpr int first_netmask = VLSYS_CHECK_CODE(0, VLSYS_CHECK_FIELD_IPV4_NETMASK, 0);
-
-struct FreeAddrinfo {
-    void operator()(addrinfo *list) const { freeaddrinfo(list); }
-};
 
 int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, size_t textcap,
                  const char *label) {
@@ -80,7 +77,7 @@ static int text_to_addr(int family, void *out, size_t size, const char *field, s
         vlsys_log(LOG_ERR, "%s: %s: %s", *label, text, gai_strerror(error));
         return fieldcode | VLSYS_CHECK_KIND_INVALID;
     }
-    const std::unique_ptr<addrinfo, FreeAddrinfo> list(result);
+    const AddressList list(result);
     memcpy(out, list->ai_addr, size);
     return 0;
 }

@@ -36,10 +36,6 @@ struct Reply {
     size_t length;
 };
 
-struct FreeAddresses {
-    void operator()(struct addrinfo *list) const { freeaddrinfo(list); }
-};
-
 static Fd connect_or_warn() {
     const int socket = vlsys_surrogate_connect(0, VLSYS_SURROGATE_PORT);
     if (socket < 0)
@@ -147,7 +143,7 @@ int vlsys_surrogate_connect(int quiet, const char *service) {
         vlsys_log(LOG_ERR, "getaddrinfo: %s", gai_strerror(error));
     if (error != 0)
         return -1;
-    const std::unique_ptr<struct addrinfo, FreeAddresses> address(list);
+    const AddressList address(list);
 
     Fd connection(
         socket(address->ai_family, address->ai_socktype | SOCK_CLOEXEC, address->ai_protocol));
