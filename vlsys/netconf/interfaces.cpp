@@ -2,8 +2,10 @@
 
 #include "core/log.h"
 
+#include <algorithm>
 #include <cstring>
 #include <net/if.h>
+#include <span>
 
 namespace vlsys {
 
@@ -48,13 +50,19 @@ int compare_ifname(const void *a, const void *b) {
                            VLSYS_IFNAME_SIZE);
 }
 
-// Moves later names up to make room in a sorted array of `count` names. Unlike qsort it stays
-// inside the array whatever the comparison says.
-static void insert(InterfaceName *names, int count, const char *name) {
-    InterfaceName *place = names + count;
-    for (; place != names && compare_ifname(place - 1, name) > 0; --place)
-        memcpy(place, place - 1, sizeof *place);
-    vlsys_strlcpy(*place, name, sizeof *place);
+// An array's element, where a plain InterfaceName can't be assigned.
+struct Name {
+    InterfaceName text;
+};
+
+static bool is_below(const Name &a, const Name &b) {
+    return compare_ifname(a.text, b.text) < 0;
+}
+
+// A heap sort stays inside the array whatever the comparison says, unlike qsort and std::sort.
+static void sort(std::span<Name> names) {
+    std::make_heap(names.begin(), names.end(), is_below);
+    std::sort_heap(names.begin(), names.end(), is_below);
 }
 
 InterfaceList::InterfaceList() {
@@ -105,14 +113,16 @@ int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]) {
         count += is_listed(entry->if_name);
     if (count == 0 || !pifn)
         return count;
-    *pifn = static_cast<InterfaceName *>(calloc(static_cast<size_t>(count), sizeof **pifn));
-    if (!*pifn) {
+    auto *const names = static_cast<Name *>(calloc(static_cast<size_t>(count), sizeof(Name)));
+    *pifn = reinterpret_cast<InterfaceName *>(names);
+    if (!names) {
         vlsys_log(LOG_ERR, "*pifn = calloc(%d, %d): %m", VLSYS_IFNAME_SIZE, count);
         return 0;
     }
-    int listed = 0;
+    Name *next = names;
     for (const struct if_nameindex *entry = index.get(); entry->if_name; ++entry)
         if (is_listed(entry->if_name))
-            insert(*pifn, listed++, entry->if_name);
+            vlsys_strlcpy((next++)->text, entry->if_name, VLSYS_IFNAME_SIZE);
+    sort({names, next});
     return count;
 }
