@@ -13,9 +13,11 @@
 #include <mutex>
 #include <net/if.h>
 #include <netinet/in.h>
+#include <netinet/tcp.h>
 #include <poll.h>
 #include <sstream>
 #include <sys/eventfd.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -66,6 +68,12 @@ std::string link_target(const std::string &path) {
 int open_descriptors() {
     const fs::directory_iterator all("/proc/self/fd");
     return static_cast<int>(std::distance(begin(all), end(all)));
+}
+
+long peak_memory() {
+    struct rusage usage = {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss;
 }
 
 void run(const std::string &command) {
@@ -208,20 +216,31 @@ struct ScriptedSurrogate::State {
         return true;
     }
 
-    static void say(int connection, const std::string &text) {
-        send(connection, text.data(), text.size(), MSG_NOSIGNAL);
+    static bool say(int connection, const std::string &text) {
+        return send(connection, text.data(), text.size(), MSG_NOSIGNAL) > 0;
+    }
+
+    static void trickle(int connection, const std::string &text) {
+        const int on = 1;
+        setsockopt(connection, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
+        if (text.size() > 100)
+            say(connection, text);
+        else
+            for (const char c : text)
+                say(connection, {c});
     }
 
     void converse(int connection) {
         if (then == Then::close_at_once || !await(connection, 2))
             return;
-        say(connection, reply);
-        if (then == Then::close)
+        while (say(connection, reply) && then == Then::flood)
+            continue;
+        if (then == Then::close || then == Then::flood)
             return;
         if (then != Then::hold) {
             if (!await(connection, 1))
                 return;
-            say(connection, output);
+            trickle(connection, output);
             if (then == Then::await_start)
                 return;
             shutdown(connection, SHUT_WR);

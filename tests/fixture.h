@@ -19,6 +19,7 @@ std::string list_directory(const std::string &path);
 unsigned mode_of(const std::string &path);
 std::string link_target(const std::string &path);
 int open_descriptors();
+long peak_memory(); // in KiB
 // Runs a shell command; fails the test when it does not exit with 0.
 void run(const std::string &command);
 
@@ -39,8 +40,8 @@ void fail_nanosleep(int nth, int error);
 
 // A surrogate parent on 127.0.0.1:12865 that plays a script, on a thread of its own: it takes one
 // connection after the other; for each it waits for the request (up to its line feed-ended last
-// line), sends `reply`, then does what `then` says. `received()` is all that came over all
-// connections so far.
+// line), sends `reply`, then does what `then` says; a short `output` goes out byte by byte.
+// `received()` is all that came over all connections so far.
 class ScriptedSurrogate {
   public:
     enum class Then {
@@ -49,6 +50,7 @@ class ScriptedSurrogate {
         await_start,  // wait for "start\n", send `output`, close
         await_kill,   // wait for "start\n", send `output`, then wait for "kill\n" or the client's
                       // close
+        flood,        // send `reply` over and over until the client closes
         close_at_once // close without reading or sending anything
     };
     ScriptedSurrogate(std::string reply, Then then, std::string output = "");

@@ -3,6 +3,7 @@
 #include "version.h"
 
 #include <cstring>
+#include <fcntl.h>
 
 namespace vlsys {
 
@@ -44,6 +45,16 @@ static int set_up_paths() {
     return join(path_data, root, data, "malloc(path_data)");
 }
 
+// What is written to a closed standard descriptor, here or by a command, would go to the file or
+// socket that was opened next. Commands inherit these, so they are not close-on-exec.
+static void open_standard_descriptors() {
+    int fd = 0;
+    do
+        fd = open("/dev/null", O_RDWR);
+    while (fd >= 0 && fd <= STDERR_FILENO);
+    const Fd surplus(fd);
+}
+
 static int64_t get_path(const Text &path, char *buffer, size_t size) {
     constexpr int64_t not_started = -200;
     if (!path)
@@ -64,6 +75,7 @@ int vlsys_init(void) {
         vlsys_log(LOG_DEBUG, "initialized %d times", static_cast<int>(start_count));
         return 0;
     }
+    open_standard_descriptors();
     vlsys_log(LOG_INFO, "vlsys %s built on %s", VLSYS_VERSION, VLSYS_BUILD_DATE);
     const int result = set_up_paths();
     if (result < 0)

@@ -67,6 +67,17 @@ static int visit(FTS *walk, FTSENT *entry) {
     }
 }
 
+// The path without slashes at its end, which would follow a link.
+static Text without_slashes(const char *path) {
+    size_t length = strlen(path);
+    while (length > 1 && path[length - 1] == '/')
+        length--;
+    Text copy(strndup(path, length));
+    if (!copy)
+        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", path, static_cast<int>(length));
+    return copy;
+}
+
 // The next entry; null at the end, with errno 0, and when the walk failed.
 static FTSENT *next_entry(FTS *walk) {
     errno = 0;
@@ -98,7 +109,10 @@ int vlsys_remove_tree(const char *path) {
         return EFAULT;
     if (path[0] == '\0')
         return ENOENT;
-    char *const roots[] = {const_cast<char *>(path), nullptr};
+    const Text root = without_slashes(path);
+    if (!root)
+        return errno;
+    char *const roots[] = {root.get(), nullptr};
     const Walk walk(fts_open(roots, FTS_NOSTAT | FTS_PHYSICAL | FTS_XDEV, nullptr),
                     CloseWalk{path});
     if (!walk) {
