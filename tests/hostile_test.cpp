@@ -1,9 +1,6 @@
 #include "fixture.h"
 #include "vlsys.h"
 
-#include <climits>
-#include <linux/close_range.h>
-#include <memory>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -14,36 +11,32 @@ using Then = ScriptedSurrogate::Then;
 
 TEST_F(Hostile, PlantedLinksAreReplacedNotWrittenThrough) {
     set_interfaces({"eth0"});
-    run("mkdir /run/out && echo A=1 >/run/out/file && chmod 600 /run/out/file && cd /etc && for l "
-        "in "
-        "sysconfig/network sysconfig/clock localtime.new resolv.conf; do ln -sf /run/out/file $l; "
-        "done && ln -sf /run/out/none sysctl.d/velmora && ln -s out /run/link");
+    run("mkdir /run/out && cd /run/out && echo A=1 >file && chmod 600 file && cd /etc && ln -s "
+        "/run/out localtime.new && ln -s out /run/link && ln -sf /run/out/none sysctl.d/velmora && "
+        "for l in network clock ../resolv.conf; do ln -sf /run/out/file sysconfig/$l; done");
     ScriptedSurrogate surrogate("256\n", Then::close);
-    const vlsys_ifconf off = {};
-    EXPECT_EQ(vlsys_set_timezone("Etc/GMT"), 0);
-    EXPECT_EQ(vlsys_set_netif("eth0", &off) + vlsys_set_hostname("h"), 0);
-    EXPECT_EQ(vlsys_network_restart(), 1);
-    EXPECT_EQ(vlsys_remove_tree("/run/link/"), 0);
+    EXPECT_EQ(vlsys_set_timezone("UTC") + vlsys_set_ipv6_default_gateway("") +
+                  vlsys_set_hostname("h"),
+              0);
+    EXPECT_EQ(vlsys_network_restart() + vlsys_remove_tree("/run/link/"), 1);
     run("cd /etc && ! find sysconfig sysctl.d resolv.conf /run/link -type l 2>&- | grep .");
     EXPECT_EQ(read_file("/etc/sysconfig/network") + read_file("/etc/sysconfig/clock"),
-              "A=1\nHOSTNAME=h\nA=1\nZONE=\"Etc/GMT\"\n");
+              "A=1\nHOSTNAME=h\nA=1\nZONE=\"UTC\"\n");
     EXPECT_EQ(list_directory("/run/out") + read_file("/run/out/file"), "file\nA=1\n");
     EXPECT_EQ(mode_of("/run/out/file"), 0600U);
 }
 
 TEST_F(Hostile, AnAnswerIsWhatComesFirstAndAFloodIsNotCollected) {
-    const string serial_line = "MainSerialNumber: 12345 ";
-    string lines[] = {serial_line + string(32 << 20, 'x'), serial_line}; // the short one trickles
+    const string number = "MainSerialNumber: 12345 "; // alone it comes byte by byte
+    string lines[] = {number, number + string(32 << 20, 'x')};
     const long before = peak_memory();
-    for (const auto &[answer, then, result] : {std::tuple{string(8192, 'x'), Then::flood, -1},
-                                               {string(8192, '7'), Then::flood, INT_MAX},
-                                               {"2", Then::hold, 2}}) {
+    for (const auto &[answer, then, result, bytes] :
+         {std::tuple{string(8192, 'x'), Then::flood, -1, 8 << 20}, {"2", Then::hold, 2, 0}}) {
         ScriptedSurrogate surrogate(answer, then);
-        EXPECT_EQ(vlsys_system("a"), result);
-        EXPECT_EQ(vlsys_spawn("a"), result);
+        EXPECT_EQ(vlsys_system("a") + vlsys_spawn("a"), 2 * result);
         FILE *const stream = vlsys_popen("a");
-        for (int i = then == Then::flood ? 8 << 20 : 0; i > 0; i--)
-            ASSERT_EQ(getc_unlocked(stream), answer[0]);
+        for (int i = 0; i < bytes; i++)
+            ASSERT_EQ(getc_unlocked(stream), 'x');
         EXPECT_EQ(vlsys_pclose(stream), 0);
     }
     for (string &line : lines) {
@@ -72,8 +65,7 @@ TEST_F(Hostile, ClosedStandardDescriptorsTakeNothing) {
     set_interfaces({"eth0"});
     run("cd /usr/bin && rm -f fc-cache && echo echo dest: >fc-cache && chmod 755 fc-cache");
     for (const char *closed : {"<&-", ">&-", "2>&-", "<&- >&-", "<&- >&- 2>&-"}) {
-        run(string(FACTORY_PROGRAM " >/run/output 2>&1 ") + closed +
-            " && ! grep -r dest: /etc/sysconfig");
+        run(string(FACTORY_PROGRAM " >/run/o 2>&1 ") + closed + " && ! grep -r dest: /etc/sysc*");
         EXPECT_EQ(take_log().find("dest: "), string::npos) << closed; // what has the log's form
     }
 }
@@ -83,17 +75,14 @@ TEST_F(Hostile, CommandsInheritNothing) {
     close_range(3, ~0U, CLOSE_RANGE_CLOEXEC); // of whoever runs the tests
     const string list = "ls /proc/self/fd | tr '\\n' ' ' >>/run/fds";
     run("mkdir /run/bin && cd /run/bin && echo \"" + list +
-        "\" | tee fc-cache >service && chmod 755 *");
+        "\" | tee fc-cache >service && chmod +x *");
     setenv("PATH", ("/run/bin:" + string(getenv("PATH"))).c_str(), 1);
-    auto surrogate = std::make_unique<ScriptedSurrogate>("1\n", Then::await_kill);
-    FILE *const stream = vlsys_popen("a");
-    surrogate.reset();
     FILE *const direct = vlsys_popen(list.c_str());
-    EXPECT_EQ(getc(direct), EOF);
-    waitpid(vlsys_spawn(list.c_str()), nullptr, 0);
     EXPECT_EQ(vlsys_fc_cache() + vlsys_network_restart(), 0);
     run(SURROGATE_PROGRAM);
+    FILE *const stream = vlsys_popen("cat");
     EXPECT_EQ(vlsys_system(list.c_str()), 0);
-    EXPECT_EQ(vlsys_pclose(stream) + vlsys_pclose(direct), 0);
+    waitpid(vlsys_spawn_direct(list.c_str()), nullptr, 0);
+    EXPECT_EQ(vlsys_pclose(direct) + vlsys_pclose(stream), 0);
     EXPECT_EQ(read_file("/run/fds"), "0 1 2 3 0 1 2 3 0 1 2 3 0 1 2 3 0 1 2 3 ");
 }

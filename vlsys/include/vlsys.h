@@ -14,9 +14,13 @@
  * LOG_WARNING, settings written and values read at LOG_INFO, traces at LOG_DEBUG. Each operation
  * says below what else it logs, and where it fails silently.
  *
- * System files are replaced whole: a reader sees the old file or the new one, mode 0644. Files
- * named below as "<root>/..." are found under the root path (VL_ROOT), all others at the path
- * given.
+ * Blocking: what an operation waits for, and how long at most, is said with it. Beside that each
+ * takes the time of its file accesses, and each message can wait for the log (see vlsys_log).
+ *
+ * System files are replaced whole: a reader sees the old file or the new one, mode 0644. A symbolic
+ * link in a file's place is read through and replaced by a file, what it points to stays as it is;
+ * links among the directories above are followed. Files named below as "<root>/..." are found under
+ * the root path (VL_ROOT), all others at the path given.
  */
 #ifndef VLSYS_H
 #define VLSYS_H
@@ -61,7 +65,11 @@ extern "C" {
  * Starts the library: takes the paths from the environment variables VL_ROOT (default ""),
  * VL_PREFIX
  * ("/usr") and VL_DATA ("/velmora"). A variable that is set but empty counts as set; the texts are
- * joined as they are, no separator is added. On a started library it changes nothing.
+ * joined as they are, no separator is added. On a started library it changes nothing. A relative
+ * root is looked up from the working directory at each call. A system path over 4095 bytes is cut;
+ * the setters then fail with ENAMETOOLONG.
+ * A standard descriptor (0 to 2) that is closed is opened on /dev/null first, so that no file or
+ * socket of the library gets its number; vlsys_exit leaves it open.
  *
  * Returns 0, or the negated errno when a path could not be allocated; the library is then not
  * started.
@@ -110,6 +118,7 @@ VLSYS_API size_t vlsys_strlcat(char *destination, const char *source, size_t siz
  * program's short name, LOG_PID and LOG_LOCAL0 unless vlsys_openlog came before. In
  * standard-output mode it goes there, after the prefix "<ident>[<process id>]: <<level>>: [<thread
  * id>]: " (none at LOG_DEBUG), and a line feed follows unless the format itself ends in one.
+ * Blocks, without a limit, while the log daemon or the reader of standard output takes nothing.
  */
 VLSYS_API void vlsys_log(int priority, const char *format, ...) VLSYS_PRINTF(2, 3);
 VLSYS_API void vlsys_vlog(int priority, const char *format, va_list arguments) VLSYS_PRINTF(2, 0);
@@ -378,7 +387,7 @@ VLSYS_API int vlsys_get_hostname(char *name);
  *
  * Returns 0, also when the name is the running host name already (nothing is written; logged at
  * LOG_INFO); 420 for a name that breaks these rules; else the positive errno of the failed step:
- * when the kernel refuses the name, the file has it already.
+ * when the kernel refuses the name, the file has it already. Waits for the file to reach the disk.
  */
 VLSYS_API int vlsys_set_hostname_immediately(const char *name);
 
@@ -403,7 +412,7 @@ VLSYS_API int vlsys_set_hostname_immediately(const char *name);
  * resolver code of an address that could not be converted, with the fields up to it filled, but not
  * name, index and the modes; the positive errno of an interface file that cannot be read, with all
  * filled but ipv4_mode. An interface that vanishes meanwhile leaves name and index unwritten.
- * Reads the kernel's list once; waits 11 seconds for each switch file that is missing.
+ * Reads the kernel's list once; waits 11 seconds for a switch file that is missing.
  */
 VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
 
@@ -519,13 +528,18 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  *   (vlsys_popen: the whole request at LOG_DEBUG), and what each says below. A reply that is
  *   missing or is no number is not logged. A command that is run directly is not logged, but for
  *   what vlsys_spawn_direct logs.
- * - They block until the answer comes; no time limit. No signal is raised when the surrogate parent
- *   goes away, and the connection is closed in programs that the process executes.
+ * - They block until the surrogate parent takes the connection (by the kernel's settings about 2
+ *   minutes, then the command is run directly), has taken the request, and answers; the rest has no
+ *   limit.
+ * - The answer is what arrives first, at most 8191 bytes; it is not asked again, and believed.
+ * - No signal is raised when the surrogate parent goes away, and the connection is closed in
+ *   programs that the process executes.
  */
 #define VLSYS_SURROGATE_PORT "12865"
 
 /*
- * Connects to a TCP service of 127.0.0.1, given as a decimal port number.
+ * Connects to a TCP service of 127.0.0.1, given as a decimal port number. Blocks up to about 2
+ * minutes, by the kernel's settings, while the service takes no connection.
  *
  * Returns the connected socket, close-on-exec, which the caller closes; -1 on failure; with `quiet`
  * not 0, 0 when the connection was refused, which is then not logged (descriptor 0 must be open, or
@@ -534,7 +548,7 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
 VLSYS_API int vlsys_surrogate_connect(int quiet, const char *service);
 
 /*
- * Runs a shell command and waits for its end. Directly: system().
+ * Runs a shell command and waits for its end, without a limit. Directly: system().
  *
  * Returns the command's wait status (exit code in bits 8 to 15, see vlsys_exit_status_text),
  * clamped to the range of int, or -1 with errno set: ECONNRESET when the surrogate parent closed
@@ -547,7 +561,8 @@ VLSYS_API int vlsys_system(const char *command);
 /*
  * Starts a shell command in the background. Directly: vlsys_spawn_direct.
  *
- * Returns its process id, or -1 with errno set as for vlsys_system. The command is a child of the
+ * Returns its process id, or -1 with errno set as for vlsys_system. The surrogate parent's number
+ * is not checked: one below 1 is no process to send a signal to. The command is a child of the
  * surrogate parent, and of the caller only when it was started directly. Logs the answer and the
  * process id at LOG_DEBUG.
  */
@@ -556,7 +571,8 @@ VLSYS_API int vlsys_spawn(const char *command);
 /*
  * Runs a shell command and gives a stream to read its output from. Directly: popen(command, "re").
  * From the surrogate parent, the last line of the stream is the command's wait status in decimal.
- * Close it with vlsys_pclose. The stream's descriptor is close-on-exec.
+ * Close it with vlsys_pclose. The stream's descriptor is close-on-exec. Reading blocks, without a
+ * limit, until the command writes or ends.
  *
  * Returns null with errno set on failure. Working directory and command together may have up to
  * 1019 bytes, else errno is E2BIG, or ERANGE when the directory alone has over 1023; nothing is run
@@ -566,7 +582,8 @@ VLSYS_API FILE *vlsys_popen(const char *command);
 
 /*
  * Closes a stream of vlsys_popen. A command that the surrogate parent is still running is ended;
- * this takes 1 second in any case. One that was run directly is waited for.
+ * this takes 1 second in any case. One that was run directly is waited for
+ * without a limit.
  *
  * Returns 0, also when the command could not be told to end (logged); the wait status that pclose
  * gives when the command was run directly; -1 for a null stream.
@@ -675,8 +692,8 @@ VLSYS_API int vlsys_get_hdcp_capability(void);
 
 /*
  * The unit's main serial number, cut to a buffer of `size` bytes; "00000" when the unit names none.
- * Runs "/usr/bin/Tovrin version -d krd" with vlsys_popen, waits for it without a limit, and closes
- * it with vlsys_pclose, which takes 1 second more when the surrogate parent ran it.
+ * Runs "/usr/bin/Tovrin version -d krd" with vlsys_popen, reads to the end without a limit, and
+ * closes it with vlsys_pclose, which takes 1 second more when the surrogate parent ran it.
  *
  * The last line of the output is taken as the command's wait status, which the surrogate parent
  * sends; a text that does not begin with a number counts as 0.
@@ -775,7 +792,7 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * a range that its field does not allow, a link-local address without scope, a name with a
  * misplaced character (one that is too long is logged) and a missing server[0]. A netmask made of
  * a prefix length is logged at LOG_DEBUG.
- * Asks the kernel for interface names only; no name is looked up, nothing blocks.
+ * Asks the kernel for interface names only; no host name is looked up, nothing is waited for.
  */
 VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,
                                   char *hostname);
@@ -843,14 +860,15 @@ VLSYS_API int vlsys_mkdir(const char *path, unsigned int mode);
 
 /*
  * Removes a file, or a directory with all that is in it. Symbolic links are removed, not followed;
- * other file systems mounted below are not entered. The working directory changes during the call.
+ * other file systems mounted below are not entered; slashes at the path's end are ignored. The
+ * working directory changes during the call, and the names of a directory are held in memory.
  *
  * Returns 0, or a positive errno: EFAULT for a null path and ENOENT for an empty one (neither is
  * logged), else that of the first removal that failed, or of the walk itself, which ends the work:
- * what was not yet removed stays.
- * A directory that cannot be read is passed over silently: removing its parent then fails, or, when
- * it is the path itself, it stays and the result is 0. Any other entry that cannot be walked is
- * logged at LOG_ERR (a directory cycle at LOG_WARNING) and passed over.
+ * what was not yet removed stays. Paths below it of over 32,000 bytes can end the walk
+ * with ENAMETOOLONG. A directory that cannot be read is passed over silently: removing its parent
+ * then fails, or, when it is the path itself, it stays and the result is 0. Any other entry that
+ * cannot be walked is logged at LOG_ERR (a directory cycle at LOG_WARNING) and passed over.
  */
 VLSYS_API int vlsys_remove_tree(const char *path);
 
