@@ -27,11 +27,11 @@ TEST_F(Hostile, PlantedLinksAreReplacedNotWrittenThrough) {
 }
 
 TEST_F(Hostile, AnAnswerIsWhatComesFirstAndAFloodIsNotCollected) {
-    const string number = "MainSerialNumber: 12345 "; // alone it comes byte by byte
-    string lines[] = {number, number + string(32 << 20, 'x')};
+    string lines[] = {"MainSerialNumber: 12345 ", "MainSerialNumber: 12345 "};
+    lines[1].append(32 << 20, 'x'); // the other one comes byte by byte
     const long before = peak_memory();
     for (const auto &[answer, then, result, bytes] :
-         {std::tuple{string(8192, 'x'), Then::flood, -1, 8 << 20}, {"2", Then::hold, 2, 0}}) {
+         {std::tuple{string(8192, 'x'), Then::flood, -1, 12 << 20}, {"2", Then::hold, 2, 0}}) {
         ScriptedSurrogate surrogate(answer, then);
         EXPECT_EQ(vlsys_system("a") + vlsys_spawn("a"), 2 * result);
         FILE *const stream = vlsys_popen("a");
@@ -44,7 +44,7 @@ TEST_F(Hostile, AnAnswerIsWhatComesFirstAndAFloodIsNotCollected) {
         char serial[16] = "";
         EXPECT_EQ(vlsys_get_serial_number(serial, sizeof serial), 5);
     }
-    EXPECT_LT(peak_memory() - before, 4 << 10);
+    EXPECT_LT(peak_memory() - before, 10 << 10);
 }
 
 TEST_F(Hostile, ARootPathMayBeRelativeButNotTooLong) {
