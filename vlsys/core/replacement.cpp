@@ -59,6 +59,8 @@ int Replacement::write_failed() const {
 int Replacement::commit(Flush flush) {
     if (fflush(stream_.get()) != 0)
         return write_failed();
+    // A process killed right after the rename leaves the mode that the file has now.
+    fchmod(fileno(stream_.get()), 0644);
     if (flush == Flush::to_disk && fsync(fileno(stream_.get())) != 0) {
         vlsys_log(LOG_ERR, "fsync(%s): %m", temporary_.get());
         return -errno;
