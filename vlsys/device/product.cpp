@@ -22,7 +22,7 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
     char line[8192];
     char status_text[8] = "";
     size_t length = 0;
-    while (read_line(stream, line, sizeof line)) {
+    while (!ferror(stream) && read_line(stream, line, sizeof line)) {
         vlsys_log(LOG_DEBUG, "%s", line);
         char *rest = nullptr;
         const char *const key = strtok_r(line, " \t:\n", &rest);
@@ -31,6 +31,10 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
             length = vlsys_strlcpy(buffer, value ? value : "00000", size);
         }
         vlsys_strlcpy(status_text, line, sizeof status_text);
+    }
+    if (ferror(stream)) {
+        vlsys_log(LOG_ERR, "fgets(%s): %m", serial_number_command);
+        return -errno;
     }
     *status = static_cast<int>(strtol(status_text, nullptr, 10)); // seven characters always fit
     return static_cast<int>(length);
@@ -78,6 +82,8 @@ int vlsys_get_serial_number(char *buffer, size_t size) {
     const int length = read_serial_number(stream, buffer, size, &status);
     const int closed = vlsys_pclose(stream);
 
+    if (length < 0)
+        return length;
     const int exit_code = (status >> 8) & 0xff;
     if ((status & 0x7f) != 0)
         return -200 - status;

@@ -701,7 +701,7 @@ VLSYS_API int vlsys_get_hdcp_capability(void);
  * Returns
  *   the length of the whole serial number (the text was cut when that is `size` or more);
  *   0 when the output has no serial number: the buffer is then left as it was;
- *   the negated errno when the command could not be started;
+ *   the negated errno when the command could not be started, or its output not read;
  *   -200 minus the wait status when the command was ended by a signal;
  *   -200 minus the exit code when that is not 0;
  *   -301 minus the result of vlsys_pclose when that is not 0 (only when the command ran without the
