@@ -329,7 +329,8 @@ VLSYS_API int vlsys_get_dns_settings(vlsys_dns *dns);
  * when `addr` is not empty or the mode is Manual; otherwise only the one named in `iface`.
  *
  * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed rewrite,
- * with earlier files rewritten.
+ * with earlier files rewritten. When the list of interfaces cannot be had (logged) that counts as
+ * none: the result is 0, with only the first file rewritten.
  * Logs "IPv4 GW " and the address, "none" (Off, Manual) or "dhcp" at LOG_INFO, each interface's
  * DEFROUTE at LOG_DEBUG. Waits for each file to reach the disk.
  */
@@ -350,6 +351,7 @@ VLSYS_API int vlsys_set_ipv4_default_gateway(const char *text);
  *
  * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed step:
  * the first file's rewrite (the second is then untouched), memory, or the second file's rewrite.
+ * A list of interfaces that cannot be had counts as none, as above.
  * Logs at LOG_INFO "IPv6 GW " and the address, "none" (Off, Manual), "dhcp" or "auto", and
  * "IPv6 GW auto (<name>)" for each interface set to 1; the number of interfaces and the lines at
  * LOG_DEBUG. Waits for each file to reach the disk.
