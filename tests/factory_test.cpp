@@ -3,26 +3,9 @@
 #include "unit/sandbox.h"
 
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 using namespace test;
-
-struct ToolRun {
-    std::string output;
-    int status; // exit status
-};
-
-// Runs the tool, or with a prefix the command that runs it.
-static ToolRun run_tool(const std::string &prefix = "") {
-    FILE *const pipe = popen((prefix + " " FACTORY_PROGRAM).c_str(), "r");
-    ToolRun result;
-    for (int c = 0; (c = getc(pipe)) != EOF;)
-        result.output.push_back(static_cast<char>(c));
-    const int status = pclose(pipe);
-    result.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    return result;
-}
 
 // The tool in a unit of its own kind; the surrogate parent runs, the font cache is not rebuilt.
 class Factory : public Unit {
@@ -54,8 +37,8 @@ TEST_F(Factory, SetsUpTheUnitForItsDestination) {
         SCOPED_TRACE(c.kind);
         unit::make_unit_files(c.kind);
         for (int again = 0; again < 2; again++) { // a second run changes nothing
-            const ToolRun tool = run_tool();
-            EXPECT_EQ(tool.output,
+            const Output tool = capture(FACTORY_PROGRAM);
+            EXPECT_EQ(tool.text,
                       std::string("dest: ") + c.destination + "\ntimezone: " + c.zone + "\n");
             EXPECT_EQ(tool.status, 0);
             EXPECT_EQ(link_target("/etc/localtime"), std::string("/usr/share/zoneinfo/") + c.zone);
@@ -95,13 +78,13 @@ TEST_F(Factory, NamesTheUnitAfterWhatFitsOfItsSerialNumber) {
                  {"123456789012345678", "rhx416-12345678"}};
     for (const auto &c : cases) {
         write_file("/run/serial-number", c.serial);
-        EXPECT_EQ(run_tool().status, 0);
+        EXPECT_EQ(capture(FACTORY_PROGRAM).status, 0);
         EXPECT_EQ(read_file("/etc/sysconfig/network"),
                   std::string("NETWORKING=yes\nHOSTNAME=") + c.hostname + "\n");
     }
     // A tool that lists no serial number, but succeeds.
     write_file("/usr/bin/Tovrin", "#!/bin/sh\necho 'Board : KRD-31'\n");
-    EXPECT_EQ(run_tool().status, 0);
+    EXPECT_EQ(capture(FACTORY_PROGRAM).status, 0);
     EXPECT_EQ(read_file("/etc/sysconfig/network"), "NETWORKING=yes\nHOSTNAME=rhx416-00000\n");
 }
 
@@ -111,56 +94,10 @@ static std::string error(const char *function, int number) {
 
 static const std::string good_start = "dest: SY\ntimezone: Etc/GMT\n";
 
-// The new names of a trace's renames, one per line.
-static std::string renamed_to(const std::string &trace) {
-    std::string names;
-    for (size_t at = 0; (at = trace.find(", \"", at)) != std::string::npos; at += 3)
-        names += trace.substr(at + 3, trace.find('"', at + 3) - at - 3) + "\n";
-    return names;
-}
-
-TEST_F(Factory, EndsAtTheFirstFailureOfAWrite) {
-    // The tool's files in the order in which it puts them in place: each rename fails once, and no
-    // file after it is touched.
-    const struct {
-        const char *file, *function;
-        int number;
-    } renames[] = {
-        {"/etc/localtime", "factory_init_timezone", 42},
-        {"/etc/sysconfig/clock", "factory_init_timezone", 42},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth0", "factory_init_network", 74},
-        {"/etc/sysctl.d/velmora", "factory_init_network", 74},
-        {"/etc/sysconfig/network", "factory_init_network", 78},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth0", "factory_init_network", 78},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth1", "factory_init_network", 78},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth2", "factory_init_network", 78},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth10", "factory_init_network", 78},
-        {"/etc/sysconfig/network", "factory_init_network", 82},
-        {"/etc/sysctl.d/velmora", "factory_init_network", 82},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth0", "factory_init_network", 86},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth1", "factory_init_network", 86},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth2", "factory_init_network", 86},
-        {"/etc/sysconfig/network-scripts/ifcfg-eth10", "factory_init_network", 86},
-        {"/etc/sysconfig/network", "factory_init_network", 94},
-    };
-    std::string done;
-    for (size_t i = 0; i < std::size(renames); i++) {
-        SCOPED_TRACE(renames[i].file + std::string(" ") + std::to_string(renames[i].number));
-        unit::make_unit_files("sy");
-        const ToolRun tool = run_tool("ASAN_OPTIONS=detect_leaks=0 strace -qq -o /run/trace -e "
-                                      "trace=/^rename -e inject=/^rename:error=EIO:when=" +
-                                      std::to_string(i + 1));
-        EXPECT_EQ(tool.output, good_start + error(renames[i].function, renames[i].number));
-        EXPECT_EQ(tool.status, 255);
-        EXPECT_EQ(renamed_to(read_file("/run/trace")), done += renames[i].file + std::string("\n"));
-        EXPECT_EQ(list_directory("/etc/sysconfig"), "clock\nnetwork\nnetwork-scripts\n");
-    }
-}
-
 TEST_F(Factory, EndsAtTheFirstFailureOfAStep) {
     write_file("/run/serial-number", "");
-    ToolRun tool = run_tool();
-    EXPECT_EQ(tool.output,
+    Output tool = capture(FACTORY_PROGRAM);
+    EXPECT_EQ(tool.text,
               good_start + error("factory_make_hostname", 53) + error("factory_init_network", 90));
     EXPECT_EQ(tool.status, 255);
     EXPECT_EQ(read_file("/etc/sysconfig/network"),
@@ -169,16 +106,16 @@ TEST_F(Factory, EndsAtTheFirstFailureOfAStep) {
 
     unit::make_unit_files("sy");
     set_font_cache_status(1);
-    tool = run_tool();
-    EXPECT_EQ(tool.output, good_start + error("main", 125));
+    tool = capture(FACTORY_PROGRAM);
+    EXPECT_EQ(tool.text, good_start + error("main", 125));
     EXPECT_EQ(tool.status, 255);
     EXPECT_EQ(read_file("/etc/sysconfig/network"), "NETWORKING=yes\nHOSTNAME=rhx416-41600123\n");
 
     set_interfaces({"eth1"});
     unit::make_unit_files("sy");
     const std::string before = read_file("/etc/sysconfig/network");
-    tool = run_tool();
-    EXPECT_EQ(tool.output, good_start + error("factory_init_network", 74));
+    tool = capture(FACTORY_PROGRAM);
+    EXPECT_EQ(tool.text, good_start + error("factory_init_network", 74));
     EXPECT_EQ(tool.status, 255);
     EXPECT_EQ(read_file("/etc/sysconfig/network"), before);
 }

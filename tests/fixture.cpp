@@ -80,6 +80,16 @@ void run(const std::string &command) {
     ASSERT_EQ(system(command.c_str()), 0) << command;
 }
 
+Output capture(const std::string &command) {
+    FILE *const pipe = popen(command.c_str(), "r");
+    Output output;
+    for (int c = 0; (c = getc(pipe)) != EOF;)
+        output.text.push_back(static_cast<char>(c));
+    const int status = pclose(pipe);
+    output.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    return output;
+}
+
 void set_interfaces(const std::vector<std::string> &names) {
     const auto wanted = [&](const std::string &name) {
         return std::find(names.begin(), names.end(), name) != names.end();

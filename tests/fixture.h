@@ -23,6 +23,13 @@ long peak_memory(); // in KiB
 // Runs a shell command; fails the test when it does not exit with 0.
 void run(const std::string &command);
 
+struct Output {
+    std::string text;
+    int status; // exit status; -1 when it did not exit
+};
+// Runs a shell command, whose standard output it takes.
+Output capture(const std::string &command);
+
 // Makes exactly these interfaces present besides lo, all with carrier (removes the others).
 void set_interfaces(const std::vector<std::string> &names);
 

@@ -73,15 +73,6 @@ TEST_F(Netconf, EditFailsWithTheOldFileInPlace) {
     EXPECT_EQ(list_directory("/run/full") + read_file("/run/full/f"), "f\nfill\nA=1\n");
 }
 
-TEST_F(Netconf, WhatDidNotReachTheDiskIsNotPutInPlace) {
-    set_interfaces({"eth0"});
-    run("ASAN_OPTIONS=detect_leaks=0 strace -qq -o /run/trace -e trace=fsync,/^rename,/^chmod -e "
-        "inject=fsync:error=EIO:when=2 " FACTORY_PROGRAM " >/run/output || true");
-    run("tail -n 4 /run/trace | cut -c 1-5 | tr -d '\\n' | grep -qx 'fsyncrenamchmodfsync'");
-    EXPECT_TRUE(
-        take_log().ends_with("Input/output error\n3 edit(/etc/sysctl.d/velmora): failed\n"));
-}
-
 TEST_F(Netconf, InterfacesAreInNaturalOrder) {
     const std::tuple<const char *, const char *, int, int> cases[] = {
         {"eth2", "eth10", 16, -8}, {"eth01", "eth1", 16, -1}, {"eth", "eth1", 16, -1},
