@@ -62,7 +62,9 @@ class Faults : public Unit, public testing::WithParamInterface<std::string> {
 
 // Every file is whole: as one of the steps leaves it.
 Files Faults::read_files(bool learn) {
-    Files files = {{"/etc/sysctl.d/velmora", ""}};
+    Files files;
+    for (const auto &known : versions_)
+        files[known.first] = ""; // as long as it is not seen
     left_ = "";
     for (const auto &entry : std::filesystem::recursive_directory_iterator("/etc")) {
         const std::string path = entry.path(), target = link_target(path);
@@ -88,6 +90,7 @@ void Faults::SetUp() {
         "ip route replace default via 2001:db8::1; ln -sf true /usr/bin/fc-cache;"
         "cp /etc/sysconfig/clock /run/other-root/etc/sysconfig;" +
         std::string(GetParam() == "tool_alone" ? "" : SURROGATE_PROGRAM));
+    versions_["/etc/sysctl.d/velmora"] = {""};
     // "": anew. The gateway setters leave out what needs a list of interfaces that is not to be
     // had.
     for (const std::string step :
