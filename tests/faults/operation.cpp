@@ -26,7 +26,7 @@
 #name, [] { return static_cast<long>(call); }                                              \
     }
 
-static long requests, failing, blocks;
+static long requests, failing, blocks, started;
 
 static bool refuse() {
     errno = ++requests == failing ? ENOMEM : errno;
@@ -73,7 +73,8 @@ static char text[VLSYS_HOSTNAME_SIZE];
 static time_t when;
 
 static const struct Operation { const char *name; long (*run)(); } operations[] = {
-    OPERATION(init, vlsys_init()), OPERATION(set_netif, vlsys_set_netif("eth0", &off)),
+    OPERATION(init, (started = vlsys_init()) != 0 ? started : vlsys_get_path_data(nullptr, 0)),
+    OPERATION(set_netif, vlsys_set_netif("eth0", &off)),
     OPERATION(tool, __real_main()), OPERATION(tool_alone, __real_main()), // no surrogate parent
     OPERATION(set_timezone, vlsys_set_timezone("Etc/GMT")),
     OPERATION(set_ipv4_gateway, vlsys_set_ipv4_default_gateway(nullptr)),
