@@ -36,7 +36,9 @@ static Done perform(const std::string &operation, const std::string &strace = ""
                  "", 0, 0, 0};
     std::string &text = done.output.text;
     const size_t last = text.rfind('\n') + 1;
-    sscanf(&text[last], "%ld %ld", &done.result, &done.requests);
+    char *rest = nullptr;
+    done.result = strtol(&text[last], &rest, 10);
+    done.requests = strtol(rest, nullptr, 10);
     text.erase(last);
     for (const auto &message : take_raw_log()) {
         done.errors += message.starts_with("<131>");
@@ -103,6 +105,7 @@ void Faults::SetUp() {
     }
     reset();
     undisturbed_ = perform(GetParam());
+    EXPECT_EQ(undisturbed_.output.status, 0);
     EXPECT_EQ(read_files(), new_);
 }
 

@@ -29,8 +29,10 @@
 static long requests, failing, blocks, started;
 
 static bool refuse() {
-    errno = ++requests == failing ? ENOMEM : errno;
-    return requests == failing;
+    if (++requests != failing) // errno is not there yet at the very start
+        return false;
+    errno = ENOMEM;
+    return true;
 }
 
 static void *count(void *memory) {
