@@ -1,5 +1,6 @@
 // What setters, readers and the tool promise, by force: they are killed at every system call, every
 // system call fails once, every allocation fails once (see faults/operation.cpp).
+#include "core/text.h"
 #include "fixture.h"
 #include "unit/sandbox.h"
 
@@ -69,7 +70,8 @@ Files Faults::read_files(bool learn) {
         files[known.first] = ""; // as long as it is not seen
     left_ = "";
     for (const auto &entry : std::filesystem::recursive_directory_iterator("/etc")) {
-        const std::string path = entry.path(), target = link_target(path);
+        const std::string path = entry.path();
+        const std::string target = link_target(path);
         if (entry.is_directory() || target.starts_with("/run/host/"))
             continue;
         if (learn || versions_.count(path) == 1)
@@ -142,7 +144,8 @@ void Faults::expect_documented(const Done &done, int error, const std::string &c
 }
 
 TEST_P(Faults, KeepThePromises) {
-    std::string output, renames;
+    std::string output;
+    std::string renames;
     for (long i = 1; i <= undisturbed_.requests; i++) {
         SCOPED_TRACE(i);
         reset();
@@ -155,17 +158,20 @@ TEST_P(Faults, KeepThePromises) {
         return;
     reset();
     perform(GetParam(), "strace -qq -s 200 -o /run/trace");
+    // A call, its number, the call before the one before; getrandom is not called in every run.
     run("awk -F '(' 'BEGIN {p = q = \"-\"} {n = ++numbers[$1]} /]: end\"/ {inside = 0} "
-        "inside && /^[a-z]/ && !/^getrandom/ {print $1, n, q; q = p; p = $1} /]: begin\"/ {inside "
-        "= 1}' "
-        "/run/trace >/run/calls");
+        "inside && /^[a-z]/ && !/^getrandom/ {print $1, n, q; q = p; p = $1} "
+        "/]: begin\"/ {inside = 1}' /run/trace >/run/calls");
     std::ifstream calls("/run/calls");
-    size_t kills = 0, not_reached = 0;
+    size_t kills = 0;
+    size_t not_reached = 0;
     for (std::string call, nth, last_but_one; calls >> call >> nth >> last_but_one; kills++) {
         EXPECT_TRUE(call != "rename" || last_but_one == "fsync" || is_tool ||
                     GetParam() == "set_timezone");
         const std::string strace =
-            " -qq -o /run/trace -e trace=" + call + " -e inject=" + call + ":when=" + nth + ":";
+            vlsys::format_text(" -qq -o /run/trace -e trace=%s -e inject=%s:when=%s:", call.c_str(),
+                               call.c_str(), nth.c_str())
+                .get();
         reset(); // --seccomp-bpf loses the signal
         not_reached += perform(GetParam(), "strace" + strace + "signal=KILL").output.status == 0;
         SCOPED_TRACE(strace);
@@ -181,8 +187,10 @@ TEST_P(Faults, KeepThePromises) {
             expect_documented(done, error, call);
             if (!is_tool || call != "rename" || (everything && error != EIO))
                 continue;
-            const std::string trace = read_file("/run/trace"), &text = done.output.text;
-            const size_t end = trace.rfind("\") ="), start = trace.rfind('/', end) + 1;
+            const std::string trace = read_file("/run/trace");
+            const size_t end = trace.rfind("\") =");
+            const size_t start = trace.rfind('/', end) + 1;
+            const std::string &text = done.output.text;
             renames += trace.substr(start, end - start) + text.substr(text.rfind(' '));
         }
     }

@@ -41,6 +41,8 @@ static void *count(void *memory) {
 }
 
 // clang-format off
+// libc's own parameter names are reserved.
+// NOLINTBEGIN(readability-inconsistent-declaration-parameter-name)
 extern "C" { // what libc calls, too
 void *REAL(malloc)(size_t), *REAL(calloc)(size_t, size_t), *REAL(realloc)(void *, size_t);
 void REAL(free)(void *);
@@ -61,9 +63,10 @@ int getaddrinfo(const char *node, const char *service, const addrinfo *hints, ad
 int getnameinfo(const sockaddr *a, socklen_t b, char *c, socklen_t d, char *e, socklen_t f, int g) {
     return refuse() ? EAI_SYSTEM : NEXT(getnameinfo)(a, b, c, d, e, f, g);
 }
-unsigned int sleep(unsigned int) { return 0; }
-int nanosleep(const timespec *, timespec *) { return 0; }
+unsigned int sleep(unsigned int /*seconds*/) { return 0; }
+int nanosleep(const timespec * /*request*/, timespec * /*remaining*/) { return 0; }
 }
+// NOLINTEND(readability-inconsistent-declaration-parameter-name)
 
 static vlsys_ifconf off, nif, nifs[2] = {
     {0, "eth0", 0, "", 0, "192.168.0.10", "", "24", 0, 1, 0, {{"2001:db8::5", 64, ""}}, 1},
@@ -131,7 +134,8 @@ extern "C" int __wrap_main(int /*argc*/, char **argv) {
     vlsys_log(LOG_INFO, "begin");
     requests = 0;
     failing = strtol(argv[2], nullptr, 10);
-    const long result = operation->run(), number = requests;
+    const long result = operation->run();
+    const long number = requests;
     failing = 0;
     vlsys_log(LOG_INFO, "end");
     vlsys_exit();
