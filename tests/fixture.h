@@ -6,7 +6,9 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <mutex>
 #include <string>
+#include <thread>
 #include <vector>
 
 namespace test {
@@ -19,6 +21,7 @@ std::string list_directory(const std::string &path);
 unsigned mode_of(const std::string &path);
 std::string link_target(const std::string &path);
 int open_descriptors();
+long peak_memory(); // in KiB
 long peak_memory(); // in KiB
 // Runs a shell command; fails the test when it does not exit with 0.
 void run(const std::string &command);
@@ -58,6 +61,7 @@ class ScriptedSurrogate {
         await_kill,   // wait for "start\n", send `output`, then wait for "kill\n" or the client's
                       // close
         flood,        // send `reply` over and over until the client closes
+        flood,        // send `reply` over and over until the client closes
         close_at_once // close without reading or sending anything
     };
     ScriptedSurrogate(std::string reply, Then then, std::string output = "");
@@ -67,8 +71,17 @@ class ScriptedSurrogate {
     std::string received();
 
   private:
-    struct State;
-    State *state_;
+    void serve();
+    void converse(int connection);
+    bool await(int connection, long lines);
+
+    std::string reply_;
+    Then then_;
+    std::string output_;
+    int listener_;
+    std::mutex mutex_; // held through a conversation
+    std::string received_;
+    std::thread thread_;
 };
 
 // The files of the "sy" unit in place, its interfaces not (see set_interfaces), the library started
