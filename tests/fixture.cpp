@@ -1,7 +1,6 @@
 #include "fixture.h"
 
 #include "unit/log.h"
-#include "unit/sandbox.h"
 #include "vlsys.h"
 
 #include <algorithm>
@@ -9,7 +8,6 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
-#include <net/if.h>
 #include <netinet/tcp.h>
 #include <numeric>
 #include <poll.h>
@@ -70,18 +68,6 @@ Output capture(const std::string &command) {
     const int status = pclose(pipe);
     output.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
     return output;
-}
-
-void set_interfaces(const std::vector<std::string> &names) {
-    std::set<std::string> missing(names.begin(), names.end());
-    struct if_nameindex *const present = if_nameindex();
-    for (const struct if_nameindex *entry = present; entry->if_name; ++entry)
-        if (missing.erase(entry->if_name) == 0 && strcmp(entry->if_name, "lo") != 0)
-            unit::remove_interface(entry->if_name);
-    if_freenameindex(present);
-    for (const auto &name : names)
-        if (missing.contains(name))
-            unit::add_interface(name.c_str());
 }
 
 // ---- /dev/log

@@ -3,6 +3,8 @@
 // /run is the place for files of a test's own (see unit/sandbox.h for what else can be written).
 #pragma once
 
+#include "unit/sandbox.h"
+
 #include <gtest/gtest.h>
 
 #include <cstdint>
@@ -13,6 +15,8 @@
 
 namespace test {
 
+using unit::set_interfaces;
+
 std::string read_file(const std::string &path);
 void write_file(const std::string &path, const std::string &content);
 // The names in a directory, sorted, one per line.
@@ -21,7 +25,6 @@ std::string list_directory(const std::string &path);
 unsigned mode_of(const std::string &path);
 std::string link_target(const std::string &path);
 int open_descriptors();
-long peak_memory(); // in KiB
 long peak_memory(); // in KiB
 // Runs a shell command; fails the test when it does not exit with 0.
 void run(const std::string &command);
@@ -32,9 +35,6 @@ struct Output {
 };
 // Runs a shell command, whose standard output it takes.
 Output capture(const std::string &command);
-
-// Makes exactly these interfaces present besides lo, all with carrier (removes the others).
-void set_interfaces(const std::vector<std::string> &names);
 
 // What was sent to /dev/log since the last call: one line per message, "<priority> <text>\n",
 // without time, identity, process and thread id: "6 hostname: vl\n". A line feed inside a text
@@ -61,12 +61,9 @@ class ScriptedSurrogate {
         await_kill,   // wait for "start\n", send `output`, then wait for "kill\n" or the client's
                       // close
         flood,        // send `reply` over and over until the client closes
-        flood,        // send `reply` over and over until the client closes
         close_at_once // close without reading or sending anything
     };
     ScriptedSurrogate(std::string reply, Then then, std::string output = "");
-    ScriptedSurrogate(const ScriptedSurrogate &) = delete;
-    ScriptedSurrogate &operator=(const ScriptedSurrogate &) = delete;
     ~ScriptedSurrogate();
     std::string received();
 

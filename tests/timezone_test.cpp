@@ -1,6 +1,5 @@
 #include "fixture.h"
 
-#include "unit/sandbox.h"
 #include "vlsys.h"
 
 #include <array>

@@ -9,7 +9,9 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <net/if.h>
 #include <sched.h>
+#include <set>
 #include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
@@ -175,14 +177,21 @@ void make_unit_files(const char *kind_name) {
 
 // ---- Interfaces
 
-void add_interface(const char *name) {
-    const std::string n = name;
-    run("ip link add " + n + " type veth peer name " + n + " netns outside && ip link set " + n +
-        " up && ip -n outside link set " + n + " up");
+static void add_interface(const std::string &name) {
+    run("ip link add " + name + " type veth peer name " + name + " netns outside && ip link set " +
+        name + " up && ip -n outside link set " + name + " up");
 }
 
-void remove_interface(const char *name) {
-    run(std::string("ip link del ") + name);
+void set_interfaces(const std::vector<std::string> &names) {
+    std::set<std::string> missing(names.begin(), names.end());
+    struct if_nameindex *const present = if_nameindex();
+    for (const struct if_nameindex *entry = present; entry->if_name; ++entry)
+        if (missing.erase(entry->if_name) == 0 && strcmp(entry->if_name, "lo") != 0)
+            run(std::string("ip link del ") + entry->if_name);
+    if_freenameindex(present);
+    for (const std::string &name : names)
+        if (missing.contains(name))
+            add_interface(name);
 }
 
 } // namespace unit

@@ -21,9 +21,9 @@ void enter_namespaces();
 // file, commands, and the driver status that belongs to the kind of unit (kinds.h).
 void make_unit_files(const char *kind_name);
 
-// A veth pair with carrier; its other end has the same name outside.
-void add_interface(const char *name);
-void remove_interface(const char *name);
+// Makes exactly these interfaces present besides lo, all with carrier (removes the others). Each is
+// a veth pair; its other end has the same name outside.
+void set_interfaces(const std::vector<std::string> &names);
 
 // Runs a shell command.
 void run(const std::string &command);

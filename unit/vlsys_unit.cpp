@@ -16,8 +16,7 @@ static int list_kinds() {
 static void make_unit(const unit::Kind &kind) {
     unit::enter_namespaces();
     unit::make_unit_files(kind.name);
-    for (const char *interface : {"eth0", "eth1", "eth2", "eth10", "virbr0"})
-        unit::add_interface(interface);
+    unit::set_interfaces({"eth0", "eth1", "eth2", "eth10", "virbr0"});
     if (kind.surrogate)
         unit::run("surrogate-parent");
 }
