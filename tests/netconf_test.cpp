@@ -57,20 +57,17 @@ TEST_F(Netconf, EditFailsWithTheOldFileInPlace) {
     const Items items = {{0, "C", "2"}};
     EXPECT_EQ(edit(nullptr, items.data(), 1), -EFAULT);
     EXPECT_EQ(edit("/run/f", nullptr, 0), -EFAULT);
-    run("mkdir -p /run/d/f /run/full; mount -t tmpfs -o size=64k none /run/full");
+    run("mkdir -p /run/d/f /run/full && mount -t tmpfs -o size=64k none /run/full && cd /run/full "
+        "&& echo A=1 >f && ln -s ../f g && (cat f; printf '#%01000d') >g; " // shows the last line
+        "dd if=/dev/zero of=fill bs=4k status=none 2>&- || true");
     EXPECT_EQ(edit_all("/run/d/f", items), -EISDIR);
     EXPECT_TRUE(take_log().ends_with(", /run/d/f): Is a directory\n"));
-    EXPECT_EQ(list_directory("/run/d"), "f\n");
-    write_file("/run/full/f", "A=1\n");
-    run("dd if=/dev/zero of=/run/full/fill bs=4k status=none 2>/dev/null || true");
     EXPECT_EQ(edit_all("/run/full/f", items), -ENOSPC); // seen when the stream is flushed
     EXPECT_EQ(take_log(), "3 fputs(C=2\n): No space left on device\n");
-    write_file("/run/f", "A=1\n#" + std::string(1000, 'x') + "\n"); // shows what was written last
-    run("ln -s /run/f /run/full/g");
     EXPECT_EQ(edit_all("/run/full/g", {{1, "B", ""}}), -ENOSPC);
     EXPECT_EQ(take_log(), "3 fputs(A=1\n): No space left on device\n");
-    unlink("/run/full/g");
-    EXPECT_EQ(list_directory("/run/full") + read_file("/run/full/f"), "f\nfill\nA=1\n");
+    EXPECT_EQ(list_directory("/run/d") + list_directory("/run/full") + read_file("/run/full/f"),
+              "f\nf\nfill\ng\nA=1\n");
 }
 
 TEST_F(Netconf, InterfacesAreInNaturalOrder) {

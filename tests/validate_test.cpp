@@ -183,6 +183,8 @@ TEST_F(Validate, SeveralInterfaces) {
         v6=1 len6=0 1.v6=1                     | 17a
         v6=1 len6=0 gw4mode=1 gw4=10.1.0.1     | 13b
         gw6mode=1 gw6=fd00::1                  | 19b
+        v4=2 v6=3 gw4mode=1 gw4=10.9.9.9 gw6mode=1 gw6=fd00:9::1 | 0
+        v4=1 v6=1 gw4mode=1 gw4=192.168.0.1 gw6mode=1 gw6=2001:db8::2 dns=1 s0=10.9.9.9 s1=fd00:9::9 | 0 | gw4if=eth0
         gw4mode=2 gw4if=eth0                   | 13b
         gw6=fd00::1 gw6if=eth0 gw6mode=4       | 0   | gw6= gw6if= gw6mode=0
         v4=1 1.v4=1 1.len=16 1.a=192.168.9.9   | 11a | 1.mask=255.255.0.0 1.bcast=192.168.255.255 | 6 start checking: mode: MM_______; 7 netmask: 24 -> 0xffffff00; 7 netmask: 16 -> 0xffff0000; 7 (c0a8000a & ffff0000) == c0a80000; 3 192.168.0.10/24 and 192.168.9.9/16 have overlapped; 6 vlsys_address_check2: NG (0x11a)
