@@ -1,13 +1,14 @@
 #include "fixture.h"
 
 #include "unit/log.h"
+#include "unit/loopback.h"
 #include "vlsys.h"
 
 #include <algorithm>
-#include <arpa/inet.h>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <netinet/in.h>
 #include <netinet/tcp.h>
 #include <numeric>
 #include <poll.h>
@@ -54,10 +55,6 @@ long peak_memory() {
     struct rusage usage = {};
     getrusage(RUSAGE_SELF, &usage);
     return usage.ru_maxrss;
-}
-
-void run(const std::string &command) {
-    ASSERT_EQ(system(command.c_str()), 0) << command;
 }
 
 Output capture(const std::string &command) {
@@ -152,24 +149,20 @@ bool ScriptedSurrogate::await(int connection, long lines) {
     return true;
 }
 
-static bool say(int connection, const std::string &text) {
-    return send(connection, text.data(), text.size(), MSG_NOSIGNAL) > 0;
-}
-
 static void trickle(int connection, const std::string &text) {
     const int on = 1;
     setsockopt(connection, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
     if (text.size() > 100)
-        say(connection, text);
+        unit::say(connection, text);
     else
         for (const char c : text)
-            say(connection, {c});
+            unit::say(connection, {c});
 }
 
 void ScriptedSurrogate::converse(int connection) {
     if (then_ == Then::close_at_once || !await(connection, 2))
         return;
-    while (say(connection, reply_) && then_ == Then::flood)
+    while (unit::say(connection, reply_) && then_ == Then::flood)
         continue;
     if (then_ == Then::close || then_ == Then::flood)
         return;
@@ -197,15 +190,7 @@ void ScriptedSurrogate::serve() {
 
 ScriptedSurrogate::ScriptedSurrogate(std::string reply, Then then, std::string output)
     : reply_(std::move(reply)), then_(then), output_(std::move(output)),
-      listener_(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
-    const int on = 1;
-    setsockopt(listener_, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
-    const struct sockaddr_in address = {AF_INET, htons(12865), {htonl(INADDR_LOOPBACK)}, {}};
-    EXPECT_EQ(bind(listener_, reinterpret_cast<const struct sockaddr *>(&address), sizeof address),
-              0);
-    EXPECT_EQ(listen(listener_, 8), 0);
-    thread_ = std::thread(&ScriptedSurrogate::serve, this);
-}
+      listener_(unit::listen_on_loopback()), thread_(&ScriptedSurrogate::serve, this) {}
 
 ScriptedSurrogate::~ScriptedSurrogate() {
     shutdown(listener_, SHUT_RD); // ends the thread's accept

@@ -15,6 +15,7 @@
 
 namespace test {
 
+using unit::run;
 using unit::set_interfaces;
 
 std::string read_file(const std::string &path);
@@ -26,9 +27,6 @@ unsigned mode_of(const std::string &path);
 std::string link_target(const std::string &path);
 int open_descriptors();
 long peak_memory(); // in KiB
-// Runs a shell command; fails the test when it does not exit with 0.
-void run(const std::string &command);
-
 struct Output {
     std::string text;
     int status; // exit status; -1 when it did not exit

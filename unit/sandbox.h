@@ -25,7 +25,7 @@ void make_unit_files(const char *kind_name);
 // a veth pair; its other end has the same name outside.
 void set_interfaces(const std::vector<std::string> &names);
 
-// Runs a shell command.
+// Runs a shell command, which must exit with 0.
 void run(const std::string &command);
 
 } // namespace unit

@@ -5,25 +5,21 @@
 // started, and its process id sent; one that ends in " |" is announced with its process id, started
 // at "start", its output sent as it comes and after it the wait status; "kill" ends it. Any other
 // is run, and its wait status sent. A request cut short is not run.
-#include <arpa/inet.h>
+#include "unit/loopback.h"
+
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <fcntl.h>
-#include <netinet/in.h>
 #include <poll.h>
 #include <string>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-static constexpr in_port_t port = 12865;
-
-static void say(int connection, const std::string &text) {
-    send(connection, text.data(), text.size(), MSG_NOSIGNAL);
-}
+using unit::say;
 
 static void say_number(int connection, int number) {
     say(connection, std::to_string(number) + "\n");
@@ -133,24 +129,8 @@ static void serve(int connection) {
         say_number(connection, wait_for(start(directory, command)));
 }
 
-static int listen_on_loopback() {
-    struct sockaddr_in address = {};
-    address.sin_family = AF_INET;
-    address.sin_port = htons(port);
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    const int on = 1;
-    const int listener = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    setsockopt(listener, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
-    if (bind(listener, reinterpret_cast<struct sockaddr *>(&address), sizeof address) != 0 ||
-        listen(listener, 16) != 0) {
-        perror("surrogate-parent");
-        exit(1);
-    }
-    return listener;
-}
-
 int main() {
-    const int listener = listen_on_loopback();
+    const int listener = unit::listen_on_loopback();
     if (daemon(1, 1) != 0)
         return 1;
     signal(SIGPIPE, SIG_IGN);
