@@ -181,7 +181,8 @@ TEST_F(Validate, SeveralInterfaces) {
         v4=1 gw4mode=2 gw4if=eth0              | 13b
         1.v6=1 1.len6=129                      | 287
         v6=1 len6=0 1.v6=1                     | 17a
-        v6=1 len6=0 gw4mode=1 gw4=10.1.0.1     | 13b
+        v6=1 len6=0                            | 0
+        gw4mode=1 gw4=10.1.0.1                 | 13b
         gw6mode=1 gw6=fd00::1                  | 19b
         v4=2 v6=3 gw4mode=1 gw4=10.9.9.9 gw6mode=1 gw6=fd00:9::1 | 0
         v4=1 v6=1 gw4mode=1 gw4=192.168.0.1 gw6mode=1 gw6=2001:db8::2 dns=1 s0=10.9.9.9 s1=fd00:9::9 | 0 | gw4if=eth0
