@@ -5,6 +5,7 @@
 #include "vlsys.h"
 
 #include <algorithm>
+#include <csignal>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -179,6 +180,9 @@ void ScriptedSurrogate::converse(int connection) {
 }
 
 void ScriptedSurrogate::serve() {
+    sigset_t all; // signals are for the test's own thread
+    sigfillset(&all);
+    pthread_sigmask(SIG_BLOCK, &all, nullptr);
     const struct timeval patience = {5, 0}; // with a client that never closes
     for (int connection; (connection = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC)) >= 0;) {
         const std::lock_guard lock(mutex_);
