@@ -3,23 +3,25 @@
 #include "core/log.h"
 #include "core/text.h"
 
+#include <cstring>
 #include <fcntl.h>
+#include <utility>
 
 namespace vlsys {
 
 Replacement::~Replacement() {
     const SavedErrno caller;
-    stream_.reset();
     fd_.reset();
     if (temporary_)
         unlink(temporary_.get());
 }
 
-int Replacement::create(const char *path, char separator) {
+int Replacement::create(const char *path, char separator, Failure failure) {
     path_ = path;
     Text name = format_text("%s%cXXXXXX", path, separator);
     if (!name) {
-        vlsys_log(LOG_ERR, "asprintf(\"%%s%cXXXXXX\", %s): %m", separator, path);
+        if (failure == Failure::logged)
+            vlsys_log(LOG_ERR, "asprintf(\"%%s%cXXXXXX\", %s): %m", separator, path);
         return -errno;
     }
     {
@@ -27,45 +29,55 @@ int Replacement::create(const char *path, char separator) {
         fd_.reset(mkostemp(name.get(), O_CLOEXEC));
     }
     if (!fd_) {
-        vlsys_log(LOG_ERR, "mkstemp(%s): %m", name.get());
+        if (failure == Failure::logged)
+            vlsys_log(LOG_ERR, "mkstemp(%s): %m", name.get());
         return -errno;
     }
     temporary_ = std::move(name);
     return 0;
 }
 
-int Replacement::open() {
-    stream_.reset(fdopen(fd_.get(), "w"));
-    if (!stream_) {
-        vlsys_log(LOG_ERR, "%s: %m", "fdopen(fd, \"w\")");
-        return -errno;
-    }
-    fd_.release();
-    return 0;
-}
-
-int Replacement::write(std::string_view bytes) {
-    last_ = bytes;
-    if (fwrite(bytes.data(), 1, bytes.size(), stream_.get()) != bytes.size())
-        return write_failed();
-    return 0;
-}
-
-int Replacement::write_failed() const {
-    vlsys_log(LOG_ERR, "fputs(%.*s): %m", static_cast<int>(last_.size()), last_.data());
+static int write_failed(std::string_view bytes) {
+    vlsys_log(LOG_ERR, "fputs(%.*s): %m", static_cast<int>(bytes.size()), bytes.data());
     return -errno;
 }
 
-int Replacement::commit(Flush flush) {
-    if (fflush(stream_.get()) != 0)
-        return write_failed();
+int Replacement::write(std::string_view bytes) {
+    if (bytes.size() > sizeof buffer_ - pending_ && !flush())
+        return write_failed(bytes);
+    if (bytes.size() > sizeof buffer_)
+        return write_all(bytes) ? 0 : write_failed(bytes);
+    last_ = {buffer_ + pending_, bytes.size()};
+    memcpy(buffer_ + pending_, bytes.data(), bytes.size());
+    pending_ += bytes.size();
+    return 0;
+}
+
+bool Replacement::flush() {
+    const size_t length = std::exchange(pending_, 0);
+    return write_all({buffer_, length});
+}
+
+bool Replacement::write_all(std::string_view bytes) const {
+    while (!bytes.empty()) {
+        const ssize_t length = TEMP_FAILURE_RETRY(::write(fd_.get(), bytes.data(), bytes.size()));
+        if (length < 0)
+            return false;
+        bytes.remove_prefix(static_cast<size_t>(length));
+    }
+    return true;
+}
+
+int Replacement::commit(Flush to) {
+    if (!flush())
+        return write_failed(last_);
     // A process killed right after the rename leaves the mode that the file has now.
-    fchmod(fileno(stream_.get()), 0644);
-    if (flush == Flush::to_disk && fsync(fileno(stream_.get())) != 0) {
+    fchmod(fd_.get(), 0644);
+    if (to == Flush::to_disk && fsync(fd_.get()) != 0) {
         vlsys_log(LOG_ERR, "fsync(%s): %m", temporary_.get());
         return -errno;
     }
-    stream_.reset();
+    fd_.reset();
     if (rename(temporary_.get(), path_) != 0) {
         vlsys_log(LOG_ERR, "rename(%s, %s): %m", temporary_.get(), path_);
         return -errno;

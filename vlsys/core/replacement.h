@@ -8,6 +8,7 @@
 namespace vlsys {
 
 enum class Flush { none, to_disk };
+enum class Failure { logged, silent };
 
 // One file on its way to take another's place. Each step returns 0, or the negated errno after
 // logging its message. A temporary that was not committed is removed with its owner.
@@ -19,25 +20,24 @@ class Replacement {
     ~Replacement();
 
     // Makes the temporary "<path><separator>XXXXXX", mode 0600. The path must outlive this owner.
-    int create(const char *path, char separator);
-    // Opens the stream to the temporary.
-    int open();
-    // Writes bytes to the stream. They must stay valid until the next write or the commit, whose
-    // message shows them when the stream cannot be flushed.
+    int create(const char *path, char separator, Failure failure = Failure::logged);
+    // Writes bytes, such as a line, by way of a buffer.
     int write(std::string_view bytes);
     // Puts the new content in place of the old.
-    int commit(Flush flush);
+    int commit(Flush to);
     // Sets the mode of the file in place to 0644.
     int set_mode() const;
 
   private:
-    int write_failed() const;
+    bool flush();
+    bool write_all(std::string_view bytes) const;
 
     const char *path_ = nullptr;
     Text temporary_; // name of the temporary while it exists
     Fd fd_;
-    File stream_;
-    std::string_view last_;
+    char buffer_[8192];
+    size_t pending_ = 0;
+    std::string_view last_; // written to the buffer
 };
 
 } // namespace vlsys

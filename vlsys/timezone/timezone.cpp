@@ -96,15 +96,15 @@ static Text make_zone_line(const char *zone) {
 }
 
 // Copies the clock file with the zone line in place of every piece that has a zone, or at the end.
-// The piece stays the caller's, for the messages of a later commit.
-static int rewrite_clock(FILE *clock, const char *path, std::string_view zone_line, Piece *piece,
+static int rewrite_clock(FILE *clock, const char *path, std::string_view zone_line,
                          Replacement *replacement) {
+    Piece piece;
     const std::string_view cut_line(zone_line.data(),
-                                    std::min(zone_line.size(), sizeof piece->bytes - 1));
+                                    std::min(zone_line.size(), sizeof piece.bytes - 1));
     bool has_zone = false;
     bool in_line = false;
-    while (read_piece(clock, piece)) {
-        std::string_view text = piece->text();
+    while (read_piece(clock, &piece)) {
+        std::string_view text = piece.text();
         if (text.find("ZONE=") != std::string_view::npos) {
             has_zone = true;
             text = cut_line;
@@ -138,11 +138,7 @@ static int set_clock_zone(const char *zone) {
         vlsys_log(LOG_ERR, "fopen(\"%s\", \"r\"): %m", path.text);
         return -errno;
     }
-    result = replacement.open();
-    if (result != 0)
-        return result;
-    Piece piece;
-    result = rewrite_clock(clock.get(), path.text, zone_line.get(), &piece, &replacement);
+    result = rewrite_clock(clock.get(), path.text, zone_line.get(), &replacement);
     if (result == 0)
         result = replacement.commit(Flush::none);
     if (result != 0)
