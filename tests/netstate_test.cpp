@@ -151,9 +151,9 @@ TEST_F(Netstate, GatewaysAreReadFromKernelAndFiles) {
         set_fixed_interfaces({"eth0", "eth1"});
         run(prepare + commands);
         take_log();
-        const std::string gateway4 = show(vlsys_get_ipv4_default_gateway2(&gw4), gw4);
-        const std::string gateway6 = show(vlsys_get_ipv6_default_gateway2(&gw6), gw6);
-        EXPECT_EQ(gateway4 + ", " + gateway6 + "\n" + take_log(), gateways);
+        std::string state = show(vlsys_get_ipv4_default_gateway2(&gw4), gw4);
+        state += ", " + show(vlsys_get_ipv6_default_gateway2(&gw6), gw6) + "\n";
+        EXPECT_EQ(state + take_log(), gateways);
     }
     EXPECT_EQ(vlsys_get_ipv4_default_gateway(gw4.addr), ENOENT);
     EXPECT_STREQ(gw4.addr, "");
@@ -227,7 +227,8 @@ TEST_F(Netstate, SettingInForceIsTheSettingWritten) {
         const std::string link = mode4 + mode6 == 0 ? "no carrier, MAC: 02-00-00-00-00-01" :
             "link up, MAC: 02-00-00-00-00-01\n6 " + ipv4[mode4] +
             (mode4 && mode6 ? ", " : "") + ipv6[mode6];
-        EXPECT_NE(log.find("\n6" + modes + "\n6 eth0: " + link + "\n6 "), std::string::npos) << log;
+        const auto lines = format_text("\n6%s\n6 eth0: %s\n6 ", modes.c_str(), link.c_str());
+        EXPECT_NE(log.find(lines.get()), std::string::npos) << log;
     }
     EXPECT_EQ(restarts, 12 + 11 + 6);
 }
