@@ -16,7 +16,7 @@ TEST_F(Load, TimeGrowsNoFasterThanTheInterfaces) {
     for (const int factor : {1, is_long ? 32 : 16}) {
         const int count = 126 * factor;
         test::run("n=" + std::to_string(count) +
-                  "; seq -f net.ipv6.conf.e%g.mtu=1 $((4*n)) >/etc/sysctl.d/velmora; cd "
+                  "; seq -f 'net.ipv6.conf.e%g.accept_ra_defrtr = 1' $n >/etc/sysctl.d/velmora; cd "
                   "/etc/sysconfig/network-scripts; for i in $(seq $n -2 2); do echo link add "
                   "e$i group 7 type veth peer name e$((i-1)); >ifcfg-e$i; >ifcfg-e$((i-1)); done | "
                   "ip -batch -");

@@ -14,6 +14,7 @@ enum class Failure { logged, silent };
 // logging its message. A temporary that was not committed is removed with its owner.
 class Replacement {
   public:
+    // cppcheck-suppress uninitMemberVar // the buffer holds something up to pending_ only
     Replacement() = default;
     Replacement(const Replacement &) = delete;
     Replacement &operator=(const Replacement &) = delete;

@@ -28,33 +28,25 @@ static int make_directory_of(const char *path) {
 
 namespace {
 
-// The items with their lines, and which of them have met a line of the old file. A line's entry is
-// looked up in a hash table of the keys: each entry is also the slot that has its number.
+// The items with their lines, and which of them have met a line of the old file.
 class WorkingList {
   public:
     struct Entry {
-        std::string_view line; // "<key>=<value>\n"
+        std::string_view line; // "<key>=<value>\n"; empty in the entry that ends the list
         size_t match;          // how many bytes of it a line of the key begins with
         bool used;
         bool removing;
-        Entry *next;  // unused one of the same slot, in list order
-        Entry *first; // of this slot
     };
 
     int build(std::span<const edit_item> items);
     // Takes the first unused entry that the line belongs to; null when there is none.
     const Entry *take(std::string_view line);
-    std::span<const Entry> entries() const { return {entries_.get(), count_}; }
+    const Entry *begin() const { return entries_.get(); }
 
   private:
-    void add(size_t index, const edit_item &item, char *line);
-    Entry **slot(uint32_t hash) { return &entries_[hash * uint64_t{count_} >> 32].first; }
-    Entry **find(uint32_t hash, std::string_view start);
-
-    size_t count_ = 0;
-    size_t longest_ = 0; // match
     Owned<Entry[]> entries_;
     Text lines_;
+    Entry *first_unused_ = nullptr; // a file that was set before has its keys in the items' order
 };
 
 // Reads a file line by line.
@@ -79,88 +71,52 @@ class LineReader {
 
 } // namespace
 
-static constexpr uint32_t hash_start = 2166136261; // FNV-1a
-
-static uint32_t hash_on(uint32_t hash, char c) {
-    return (hash ^ static_cast<unsigned char>(c)) * 16777619;
-}
-
 static size_t line_length(const edit_item &item) {
     return strlen(item.key) + strlen(item.value) + strlen("=\n");
 }
 
 int WorkingList::build(std::span<const edit_item> items) {
-    count_ = items.size();
-    entries_.reset(static_cast<Entry *>(calloc(count_ + 1, sizeof(Entry))));
+    const size_t count = items.size() + 1;
+    entries_.reset(static_cast<Entry *>(calloc(count, sizeof(Entry))));
     if (!entries_) {
-        vlsys_log(LOG_ERR, "calloc(%d, %d): %m", static_cast<int>(count_ + 1),
+        vlsys_log(LOG_ERR, "calloc(%d, %d): %m", static_cast<int>(count),
                   static_cast<int>(sizeof(Entry)));
         return -errno;
     }
-    if (items.empty())
-        return 0;
     size_t size = 0;
     for (const edit_item &item : items)
         size += line_length(item);
     lines_.reset(static_cast<char *>(malloc(size)));
-    if (!lines_) {
+    if (!lines_ && size > 0) {
         vlsys_log(LOG_ERR, "asprintf(\"%s=%s\\n\"): %m", items[0].key, items[0].value);
         return -errno;
     }
-    // From the last one on, so that each goes before the later ones of its slot.
-    for (size_t index = count_; index-- > 0;) {
-        size -= line_length(items[index]);
-        add(index, items[index], lines_.get() + size);
+    Entry *entry = first_unused_ = entries_.get();
+    char *end = lines_.get();
+    for (const edit_item &item : items) {
+        const char *const line = end;
+        end = stpcpy(end, item.key);
+        *end++ = '=';
+        entry->match = static_cast<size_t>(end - line);
+        end = stpcpy(end, item.value);
+        *end++ = '\n';
+        entry->line = {line, static_cast<size_t>(end - line)};
+        entry->removing = item.remove == 1;
+        ++entry;
     }
     return 0;
 }
 
-void WorkingList::add(size_t index, const edit_item &item, char *line) {
-    Entry &entry = entries_[index];
-    char *end = stpcpy(line, item.key);
-    *end++ = '=';
-    entry.match = static_cast<size_t>(end - line);
-    end = stpcpy(end, item.value);
-    *end++ = '\n';
-    entry.line = {line, static_cast<size_t>(end - line)};
-    entry.removing = item.remove == 1;
-    longest_ = std::max(longest_, entry.match);
-
-    uint32_t hash = hash_start;
-    for (size_t i = 0; i < entry.match; i++)
-        hash = hash_on(hash, line[i]);
-    Entry **const first = slot(hash);
-    entry.next = *first;
-    *first = &entry;
-}
-
-// The link to the first unused entry with this key and "="; null when there is none.
-WorkingList::Entry **WorkingList::find(uint32_t hash, std::string_view start) {
-    for (Entry **link = slot(hash); *link; link = &(*link)->next)
-        if ((*link)->match == start.size() && starts_with((*link)->line, start))
-            return link;
-    return nullptr;
-}
-
 const WorkingList::Entry *WorkingList::take(std::string_view line) {
-    const std::string_view start(line.data(), std::min(line.size(), longest_));
-    Entry **link = nullptr;
-    uint32_t hash = hash_start;
-    size_t hashed = 0;
-    // A key may have a "=" too.
-    for (size_t at = 0; (at = start.find('=', at)) != std::string_view::npos; at++) {
-        for (; hashed <= at; hashed++)
-            hash = hash_on(hash, start[hashed]);
-        Entry **const found = find(hash, {start.data(), hashed});
-        if (found && (!link || *found < *link))
-            link = found;
+    for (Entry *entry = first_unused_; !entry->line.empty(); ++entry) {
+        if (entry->used || !starts_with(line, {entry->line.data(), entry->match}))
+            continue;
+        entry->used = true;
+        while (first_unused_->used)
+            ++first_unused_;
+        return entry;
     }
-    if (!link)
-        return nullptr;
-    Entry *const entry = *link;
-    *link = entry->next;
-    entry->used = true;
-    return entry;
+    return nullptr;
 }
 
 // As a rule the directory is there: it is made when the temporary can't be.
@@ -251,16 +207,14 @@ static int write_new(LineReader *old, WorkingList *list, Replacement *replacemen
         if ((result = replacement->write(line)) != 0)
             return result;
     }
-    for (const auto &entry : list->entries()) {
-        if (result != 0)
-            return result;
-        if (entry.used || entry.removing)
+    for (const auto *entry = list->begin(); result == 0 && !entry->line.empty(); ++entry) {
+        if (entry->used || entry->removing)
             continue;
         if (in_line)
             result = replacement->write("\n");
         in_line = false;
         if (result == 0)
-            result = replacement->write(entry.line);
+            result = replacement->write(entry->line);
     }
     return result;
 }
