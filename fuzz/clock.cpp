@@ -11,7 +11,8 @@ static void check(Input &in) {
     static const int ready [[maybe_unused]] =
         setenv("VL_ROOT", scratch.c_str(), 1) | vlsys_init() |
         vlsys_mkdir((scratch + "/etc/sysconfig").c_str(), 0755);
-    std::string zone = "Etc/GMT", expected;
+    std::string zone = "Etc/GMT";
+    std::string expected;
     for (size_t i = in[1].size() % 48; i > 0; i--)
         zone.insert(0, "./");
     const std::string line = "ZONE=\"" + zone + "\"\n";

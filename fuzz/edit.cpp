@@ -3,9 +3,10 @@
 #include "fuzz.h"
 
 static std::string edited(const std::string &old, std::span<const vlsys::edit_item> items) {
-    files["edited"] = old;
-    assert(vlsys::edit_or_log((scratch + "/edited").c_str(), items) == 0);
-    return read_file(scratch + "/edited");
+    const std::string path = scratch + "/edited";
+    std::ofstream(path) << old;
+    assert(vlsys::edit_or_log(path.c_str(), items) == 0);
+    return read_file(path);
 }
 
 static void check(Input &in) {
@@ -17,13 +18,17 @@ static void check(Input &in) {
     vlsys::edit_item items[8];
     size_t count = 0;
     for (size_t i = 1; i < 15; i += 2) {
-        const std::string key = in[i] = in[i].substr(0, in[i].find_first_of("=\n#")).c_str();
-        const std::string value = in[i + 1] = in[i + 1].substr(0, in[i + 1].find('\n')).c_str();
+        const std::string &key = in[i] = in[i].substr(0, in[i].find_first_of("=\n#\0", 0, 4));
+        const std::string &value = in[i + 1] =
+            in[i + 1].substr(0, in[i + 1].find_first_of("\n\0", 0, 2));
         if (key.empty() || std::count(&in[1], &in[i], key) > 0)
             continue;
         items[count++] = {value.empty(), in[i].c_str(), in[i + 1].c_str()};
-        const std::string line = value.empty() ? "" : key + "=" + value + "\n";
-        if (const size_t at = expected.find("\n" + key + "=") + 1; at > 0)
+        std::string line = key + "=";
+        const size_t at = expected.find("\n" + line) + 1;
+        line.append(value).append("\n");
+        line.resize(value.empty() ? 0 : line.size());
+        if (at > 0)
             expected.replace(at, expected.find('\n', at) + 1 - at, line);
         else if (!value.empty())
             expected += (expected.back() == '\n' ? "" : "\n") + line;
