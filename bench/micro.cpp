@@ -1,0 +1,114 @@
+// Calls of the library beside their peers. A benchmark is named <row>/<subject>/<who>: "ours", or
+// the peer. bench.py runs them with random interleaving and pairs the repetitions.
+#include "bench/bare.h"
+#include "netconf/edit.h"
+#include "vlsys.h"
+
+#include <benchmark/benchmark.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <unistd.h>
+#include <vector>
+
+static std::string numbered(const char *prefix, int number) {
+    return prefix + std::to_string(number);
+}
+
+// A sysconfig file of `lines` lines KEY<i>=value, three levels down as on the appliance, and items
+// that set `count` of its keys, evenly spread.
+struct EditInput {
+    EditInput(int lines, int count) {
+        const char *const root = getenv("BENCH_DIRECTORY");
+        path = std::string(root ? root : "/dev/shm") + "/etc/sysconfig/network-scripts/ifcfg-eth0";
+        vlsys::edit(path.c_str(), items.data(), 0); // makes the directory
+        for (int i = 0; i < lines; i++)
+            content += numbered("KEY", i) + "=a value of some length\n";
+        std::ofstream(path) << content;
+        for (int i = 0; i < count; i++)
+            keys.push_back(numbered("KEY", static_cast<int>(int64_t{i} * lines / count)));
+        for (const std::string &key : keys)
+            items.push_back({0, key.c_str(), "a value of some length"});
+    }
+
+    std::string path;
+    std::string content; // as it is after the edit, too
+    std::vector<std::string> keys;
+    std::vector<vlsys::edit_item> items = std::vector<vlsys::edit_item>(0, {0, "", ""});
+};
+
+static void edit_ours(benchmark::State &state, int lines, int count) {
+    EditInput input(lines, count);
+    for (auto _ : state)
+        if (vlsys::edit(input.path.c_str(), input.items.data(),
+                        static_cast<uint32_t>(input.items.size())) != 0)
+            state.SkipWithError("edit");
+}
+
+static void edit_bare(benchmark::State &state, int lines, int count) {
+    EditInput input(lines, count);
+    for (auto _ : state)
+        if (!replace_bare(input.path.c_str(), input.content))
+            state.SkipWithError("replace_bare");
+}
+
+static void log_ours(benchmark::State &state) {
+    for (auto _ : state)
+        vlsys_log(LOG_INFO, "IPv4 (%s): %s/%d", "eth0", "192.168.10.20", 24);
+}
+
+// The same line with nothing but the C library's own calls.
+static void log_syslog(benchmark::State &state) {
+    for (auto _ : state)
+        syslog(LOG_INFO, "[%d]: IPv4 (%s): %s/%d", gettid(), "eth0", "192.168.10.20", 24);
+}
+
+static void log_printf(benchmark::State &state) {
+    for (auto _ : state)
+        printf("%s[%d]: <%s>: [%d]: IPv4 (%s): %s/%d\n", "bench", getpid(), "INFO", gettid(),
+               "eth0", "192.168.10.20", 24);
+}
+
+static void system_ours(benchmark::State &state) {
+    vlsys_setlogmask(LOG_UPTO(LOG_WARNING));
+    for (auto _ : state)
+        if (vlsys_system("true") != 0)
+            state.SkipWithError("vlsys_system");
+    vlsys_setlogmask(LOG_UPTO(LOG_DEBUG));
+}
+
+static void system_libc(benchmark::State &state) {
+    for (auto _ : state)
+        if (system("true") != 0)
+            state.SkipWithError("system");
+}
+
+template <class Function, class... Arguments>
+static void add(const std::string &name, Function *function, Arguments... arguments) {
+    benchmark::RegisterBenchmark(name.c_str(), function, arguments...)
+        ->UseRealTime()
+        ->Unit(benchmark::kMicrosecond);
+}
+
+int main(int argc, char **argv) {
+    add("edit/12 items, 30 lines/ours", edit_ours, 30, 12);
+    add("edit/12 items, 30 lines/bare system calls", edit_bare, 30, 12);
+    for (const int lines : {10, 100, 1000, 10000, 100000})
+        add("growth/lines/" + std::to_string(lines), edit_ours, lines, 10);
+    for (const int count : {1, 10, 100, 1000})
+        add("growth/items/" + std::to_string(count), edit_ours, 1000, count);
+    add("log/syslog/ours", log_ours);
+    add("log/syslog/syslog", log_syslog);
+    add("stdout/printf/ours", log_ours);
+    add("stdout/printf/printf", log_printf);
+    add("system/true/ours", system_ours);
+    add("system/true/system", system_libc);
+
+    if (getenv("BENCH_STDOUT"))
+        vlsys_openlog("bench", 0, -1);
+    benchmark::Initialize(&argc, argv);
+    benchmark::RunSpecifiedBenchmarks();
+}
