@@ -9,6 +9,7 @@ import ctypes
 import json
 import os
 import shutil
+import socket
 import statistics
 import subprocess
 import sys
@@ -58,6 +59,8 @@ def micro(pattern, **environment):
         check=True)
     samples = {}
     for run in json.loads(scratch.read_text())["benchmarks"]:
+        if run.get("error_occurred"):
+            sys.exit(f"{run['name']}: {run['error_message']}")
         if run["run_type"] == "iteration":
             _, subject, who = run["name"].split("/")[:3]
             samples.setdefault(subject, {}).setdefault(who, []).append(run["real_time"] * 1e-6)
@@ -68,7 +71,7 @@ def micro(pattern, **environment):
 def measure(command, **environment):
     """(wall seconds, CPU seconds, peak kB) of a command."""
     out = subprocess.run([BUILD / "bench/vlsys-measure", *command], check=True, text=True,
-                         env={**os.environ, **environment}, stdout=subprocess.PIPE).stdout.split()
+                         env={**os.environ, **environment}, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL).stdout.split()
     if out[3] != "0":
         sys.exit(f"{command}: wait status {out[3]}")
     return float(out[0]), float(out[1]), float(out[2])
@@ -148,7 +151,7 @@ def row_growth():
 
 def set_interfaces(count):
     """Gives the unit eth0 to eth<count - 1>."""
-    have = {name for name in os.listdir("/sys/class/net") if name.startswith("eth")}
+    have = {name for _, name in socket.if_nameindex() if name.startswith("eth")}
     want = {f"eth{i}" for i in range(count)}
     batch = "".join(f"link del {name}\n" for name in have - want)
     batch += "".join(f"link add {name} type veth peer name {name} netns outside\n"
@@ -212,7 +215,9 @@ def row_tool():
         samples = alternate({name: lambda n=name: run(n) for name in commands})
         for name in ("sed, ln, sync", "the same, one sed"):
             if made[name] != made["ours"]:
-                sys.exit(f"{name}: not the same files")
+                wrong = {str(k) for k in made[name].keys() | made["ours"].keys()
+                         if made[name].get(k) != made["ours"].get(k)}
+                sys.exit(f"{name}: not the same files: {sorted(wrong)[:5]}")
         subject = f"tool, {count} interface{'s' if count > 1 else ''}"
         for i, (what, unit) in enumerate((("wall", "s"), ("CPU", "s"), ("peak memory", "kB"))):
             add_all(f"{subject}: {what}",

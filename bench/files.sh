@@ -6,7 +6,7 @@ scripts=$ROOT/etc/sysconfig/network-scripts
 drop='/^#/d; /^$/d'
 ln -s /usr/share/zoneinfo/Etc/GMT "$ROOT/etc/localtime.new"
 mv -T "$ROOT/etc/localtime.new" "$ROOT/etc/localtime"
-sed -i "$drop; s|^ZONE=.*|ZONE=Etc/GMT|" "$ROOT/etc/sysconfig/clock"
+sed -i 's|^ZONE=.*|ZONE="Etc/GMT"|' "$ROOT/etc/sysconfig/clock"
 
 sed -i '/^UUID=/d; /^HWADDR=/d; s/^ONBOOT=.*/ONBOOT=no/
     s/^IPV6INIT=.*/IPV6INIT=no/; s/^IPV6_AUTOCONF=.*/IPV6_AUTOCONF=no/

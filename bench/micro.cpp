@@ -24,7 +24,8 @@ struct EditInput {
     EditInput(int lines, int count) {
         const char *const root = getenv("BENCH_DIRECTORY");
         path = std::string(root ? root : "/dev/shm") + "/etc/sysconfig/network-scripts/ifcfg-eth0";
-        vlsys::edit(path.c_str(), items.data(), 0); // makes the directory
+        const vlsys::edit_item none = {};
+        vlsys::edit(path.c_str(), &none, 0); // makes the directory
         for (int i = 0; i < lines; i++)
             content += numbered("KEY", i) + "=a value of some length\n";
         std::ofstream(path) << content;
@@ -37,7 +38,7 @@ struct EditInput {
     std::string path;
     std::string content; // as it is after the edit, too
     std::vector<std::string> keys;
-    std::vector<vlsys::edit_item> items = std::vector<vlsys::edit_item>(0, {0, "", ""});
+    std::vector<vlsys::edit_item> items;
 };
 
 static void edit_ours(benchmark::State &state, int lines, int count) {
