@@ -14,12 +14,21 @@
 #include <unistd.h>
 #include <vector>
 
-static std::string numbered(const char *prefix, int number) {
-    return prefix + std::to_string(number);
+// The keys of an interface's file; further ones are numbered.
+static std::string key(int i) {
+    // clang-format off
+    static const char *const keys[] = {
+        "DEVICE", "TYPE", "ONBOOT", "BOOTPROTO", "NAME", "IPADDR", "NETMASK", "BROADCAST",
+        "NM_CONTROLLED", "USERCTL", "PEERDNS", "DNS1", "DNS2", "DOMAIN", "DEFROUTE", "IPV6INIT",
+        "IPV6ADDR", "IPV6_ROUTER", "IPV6_AUTOCONF", "DHCPV6C", "MTU", "ZONE", "ARPCHECK",
+        "ETHTOOL_OPTS", "LINKDELAY", "NOZEROCONF", "PERSISTENT_DHCLIENT", "DHCP_HOSTNAME",
+        "IPV4_FAILURE_FATAL", "IPV6_PEERDNS"};
+    // clang-format on
+    return i < static_cast<int>(std::size(keys)) ? keys[i] : "KEY" + std::to_string(i);
 }
 
-// A sysconfig file of `lines` lines KEY<i>=value, three levels down as on the appliance, and items
-// that set `count` of its keys, evenly spread.
+// An interface's file of `lines` lines, three levels down as on the appliance, and items that set
+// `count` of its keys, evenly spread.
 struct EditInput {
     EditInput(int lines, int count) {
         const char *const root = getenv("BENCH_DIRECTORY");
@@ -27,12 +36,12 @@ struct EditInput {
         const vlsys::edit_item none = {};
         vlsys::edit(path.c_str(), &none, 0); // makes the directory
         for (int i = 0; i < lines; i++)
-            content += numbered("KEY", i) + "=a value of some length\n";
+            content += key(i) + "=a value of some length\n";
         std::ofstream(path) << content;
         for (int i = 0; i < count; i++)
-            keys.push_back(numbered("KEY", static_cast<int>(int64_t{i} * lines / count)));
-        for (const std::string &key : keys)
-            items.push_back({0, key.c_str(), "a value of some length"});
+            keys.push_back(key(static_cast<int>(int64_t{i} * lines / count)));
+        for (const std::string &name : keys)
+            items.push_back({0, name.c_str(), "a value of some length"});
     }
 
     std::string path;
