@@ -24,9 +24,9 @@ static int edit(const char *path, char **settings, int count) {
     return vlsys::edit(path, items, static_cast<uint32_t>(count));
 }
 
-static int make_tree(const std::string &path, int count) {
+static int make_tree(const std::string &path, long count) {
     mkdir(path.c_str(), 0755);
-    for (int i = 0; i < count; i++) {
+    for (long i = 0; i < count; i++) {
         const std::string directory = path + "/" + std::to_string(i / 100);
         if (i % 100 == 0 && mkdir(directory.c_str(), 0755) != 0)
             return 1;
@@ -44,7 +44,7 @@ int main(int argc, char **argv) {
     if (call == "edit")
         return edit(argv[2], argv + 3, argc - 3) == 0 ? 0 : 1;
     if (call == "make-tree" && argc == 4)
-        return make_tree(argv[2], atoi(argv[3]));
+        return make_tree(argv[2], strtol(argv[3], nullptr, 10));
     if (call == "remove-tree")
         return vlsys_remove_tree(argv[2]);
     if (call == "remove-bare")
