@@ -24,7 +24,7 @@ bool replace_bare(const char *path, const std::string &content) {
         good = written > 0;
         done += static_cast<size_t>(written);
     }
-    good = good && fsync(out) == 0;
+    good = good && fchmod(out, 0644) == 0 && fsync(out) == 0;
     close(out);
     close(in);
     return good && rename(temporary.c_str(), path) == 0 && chmod(path, 0644) == 0;
