@@ -3,6 +3,8 @@
 #include "core/log.h"
 #include "core/text.h"
 
+#include <algorithm>
+#include <climits>
 #include <cstring>
 #include <fcntl.h>
 #include <utility>
@@ -38,7 +40,8 @@ int Replacement::create(const char *path, char separator, Failure failure) {
 }
 
 static int write_failed(std::string_view bytes) {
-    vlsys_log(LOG_ERR, "fputs(%.*s): %m", static_cast<int>(bytes.size()), bytes.data());
+    vlsys_log(LOG_ERR, "fputs(%.*s): %m", static_cast<int>(std::min<size_t>(bytes.size(), INT_MAX)),
+              bytes.data());
     return -errno;
 }
 
