@@ -18,12 +18,11 @@ Replacement::~Replacement() {
         unlink(temporary_.get());
 }
 
-int Replacement::create(const char *path, char separator, Failure failure) {
+int Replacement::create(const char *path, char separator) {
     path_ = path;
     Text name = format_text("%s%cXXXXXX", path, separator);
     if (!name) {
-        if (failure == Failure::logged)
-            vlsys_log(LOG_ERR, "asprintf(\"%%s%cXXXXXX\", %s): %m", separator, path);
+        vlsys_log(LOG_ERR, "asprintf(\"%%s%cXXXXXX\", %s): %m", separator, path);
         return -errno;
     }
     {
@@ -31,8 +30,7 @@ int Replacement::create(const char *path, char separator, Failure failure) {
         fd_.reset(mkostemp(name.get(), O_CLOEXEC));
     }
     if (!fd_) {
-        if (failure == Failure::logged)
-            vlsys_log(LOG_ERR, "mkstemp(%s): %m", name.get());
+        vlsys_log(LOG_ERR, "mkstemp(%s): %m", name.get());
         return -errno;
     }
     temporary_ = std::move(name);

@@ -8,7 +8,6 @@
 namespace vlsys {
 
 enum class Flush { none, to_disk };
-enum class Failure { logged, silent };
 
 // One file on its way to take another's place. Each step returns 0, or the negated errno after
 // logging its message. A temporary that was not committed is removed with its owner.
@@ -21,7 +20,7 @@ class Replacement {
     ~Replacement();
 
     // Makes the temporary "<path><separator>XXXXXX", mode 0600. The path must outlive this owner.
-    int create(const char *path, char separator, Failure failure = Failure::logged);
+    int create(const char *path, char separator);
     // Writes bytes, such as a line, by way of a buffer.
     int write(std::string_view bytes);
     // Puts the new content in place of the old.

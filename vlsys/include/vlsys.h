@@ -63,13 +63,12 @@ extern "C" {
 
 /*
  * Starts the library: takes the paths from the environment variables VL_ROOT (default ""),
- * VL_PREFIX
- * ("/usr") and VL_DATA ("/velmora"). A variable that is set but empty counts as set; the texts are
- * joined as they are, no separator is added. On a started library it changes nothing. A relative
- * root is looked up from the working directory at each call. A system path over 4095 bytes is cut;
- * the setters then fail with ENAMETOOLONG.
- * A standard descriptor (0 to 2) that is closed is opened on /dev/null first, so that no file or
- * socket of the library gets its number; vlsys_exit leaves it open.
+ * VL_PREFIX ("/usr") and VL_DATA ("/velmora"). A variable that is set but empty counts as set; the
+ * texts are joined as they are, no separator is added. On a started library it changes nothing. A
+ * relative root is looked up from the working directory at each call. A system path over 4095 bytes
+ * is cut; the setters then fail with ENAMETOOLONG. A standard descriptor (0 to 2) that is closed is
+ * opened on /dev/null first, so that no file or socket of the library gets its number; vlsys_exit
+ * leaves it open.
  *
  * Returns 0, or the negated errno when a path could not be allocated; the library is then not
  * started.
@@ -584,8 +583,8 @@ VLSYS_API FILE *vlsys_popen(const char *command);
 
 /*
  * Closes a stream of vlsys_popen. A command that the surrogate parent is still running is ended;
- * this takes 1 second in any case. One that was run directly is waited for
- * without a limit.
+ * this takes 1 second in any case. One that was run directly is waited for without
+ * a limit.
  *
  * Returns 0, also when the command could not be told to end (logged); the wait status that pclose
  * gives when the command was run directly; -1 for a null stream.
@@ -780,9 +779,9 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  *   canonical, a repeated server[1] is emptied. A server belongs to a family that is on; one of a
  *   Manual family lies in its subnet or has a gateway to go through. In IPv4 its host bits are not
  *   all zero and it is not the broadcast address (a netmask of 255.255.255.255 has neither rule);
- * in IPv6 it is not the network address. server[2] is not looked at. In the rules for DNS, and
- * throughout vlsys_address_check2, only VLSYS_MODE_MANUAL is Manual and only VLSYS_MODE_DHCP is
- * DHCP.
+ *   in IPv6 it is not the network address. server[2] is not looked at. In the rules for DNS, and
+ *   throughout vlsys_address_check2, only VLSYS_MODE_MANUAL is Manual and only VLSYS_MODE_DHCP is
+ *   DHCP.
  * - dns->iface becomes the interface, whatever the DNS mode.
  * - The host name is well-formed and at most 64 characters long; an empty one becomes "localhost",
  *   with a warning.

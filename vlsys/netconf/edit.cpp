@@ -52,15 +52,18 @@ class WorkingList {
 // Reads a file line by line.
 class LineReader {
   public:
-    // A missing file reads as an empty one.
-    int open(const char *path);
+    // Opens the file when it is there. The path must outlive the reader.
+    explicit LineReader(const char *path) : path_(path), fd_(::open(path, O_RDONLY | O_CLOEXEC)) {}
+    bool is_open() const { return static_cast<bool>(fd_); }
+    // What is not open yet is tried again; a missing file reads as an empty one.
+    int open();
     // 1 with the next line, its line feed included, valid until the next call; 0 at the end.
     int next(std::string_view *line);
 
   private:
     int fill();
 
-    const char *path_ = nullptr;
+    const char *path_;
     Fd fd_;
     Text buffer_;
     size_t capacity_ = 0;
@@ -119,21 +122,13 @@ const WorkingList::Entry *WorkingList::take(std::string_view line) {
     return nullptr;
 }
 
-// As a rule the directory is there: it is made when the temporary can't be.
-static int create(const char *path, Replacement *replacement) {
-    if (replacement->create(path, '-', Failure::silent) == 0)
-        return 0;
-    const int result = make_directory_of(path);
-    return result != 0 ? result : replacement->create(path, '-');
-}
-
-int LineReader::open(const char *path) {
-    path_ = path;
-    fd_.reset(::open(path, O_RDONLY | O_CLOEXEC));
+int LineReader::open() {
+    if (!fd_)
+        fd_.reset(::open(path_, O_RDONLY | O_CLOEXEC));
     if (fd_)
         return 0;
     if (errno != ENOENT) {
-        vlsys_log(LOG_ERR, "%s: fopen(\"%s\", \"r\"): %m", "edit", path);
+        vlsys_log(LOG_ERR, "%s: fopen(\"%s\", \"r\"): %m", "edit", path_);
         return -errno;
     }
     fd_.reset(::open("/dev/null", O_RDONLY | O_CLOEXEC));
@@ -223,13 +218,16 @@ int edit(const char *path, const edit_item *items, uint32_t count) {
     if (!path || !items)
         return -EFAULT;
     WorkingList list;
-    LineReader old;
+    LineReader old(path);
     Replacement replacement;
-    int result = list.build({items, count});
+    // The directory of a file that can be opened need not be made.
+    int result = old.is_open() ? 0 : make_directory_of(path);
     if (result == 0)
-        result = create(path, &replacement);
+        result = list.build({items, count});
     if (result == 0)
-        result = old.open(path);
+        result = replacement.create(path, '-');
+    if (result == 0)
+        result = old.open();
     if (result == 0)
         result = write_new(&old, &list, &replacement);
     if (result == 0)
