@@ -6,9 +6,9 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <fstream>
 #include <map>
 #include <set>
+#include <sstream>
 
 using namespace test;
 #ifdef __SANITIZE_ADDRESS__
@@ -46,6 +46,26 @@ static Done perform(const std::string &operation, const std::string &strace = ""
         done.log += message + "\n";
     }
     return done;
+}
+
+// The calls of a run, a line each: name, number among those of the name, the call before the one
+// before. getrandom is not called in every run.
+static std::string calls_of(const std::string &operation) {
+    reset();
+    perform(operation, "strace -qq -s 200 -o /run/trace");
+    return capture("awk -F '(' 'BEGIN {p = q = \"-\"} {n = ++numbers[$1]} /]: end\"/ {inside = 0} "
+                   "inside && /^[a-z]/ && !/^getrandom/ {print $1, n, q; q = p; p = $1} "
+                   "/]: begin\"/ {inside = 1}' /run/trace")
+        .text;
+}
+
+// The file that the trace's last rename was to put in place, and the tool's number of the failure.
+static std::string failed_rename(const Done &done) {
+    const std::string trace = read_file("/run/trace");
+    const size_t end = trace.rfind("\") =");
+    const size_t start = trace.rfind('/', end) + 1;
+    const std::string &text = done.output.text;
+    return trace.substr(start, end - start) + text.substr(text.rfind(' '));
 }
 
 class Faults : public Unit, public testing::WithParamInterface<std::string> {
@@ -112,8 +132,8 @@ void Faults::SetUp() {
 }
 
 void Faults::expect_repeatable() {
-    const Files files = read_files(); // "-XXXXXX" or ".XXXXXX" or
-    EXPECT_TRUE(left_.empty() || left_ == "/etc/localtime.new" ||
+    const Files files = read_files();
+    EXPECT_TRUE(left_.empty() || left_ == "/etc/localtime.new" || // or "-XXXXXX" or ".XXXXXX"
                 versions_.count(left_.substr(0, left_.size() - 7)) == 1);
     if (!repeated_.insert(files).second)
         return;
@@ -157,13 +177,7 @@ TEST_P(Faults, KeepThePromises) {
     EXPECT_EQ(output.find("ERROR: factory.cpp main 112\n") != std::string::npos, is_tool);
     if (sanitized || GetParam().starts_with("get_") || (GetParam() == "tool_alone" && !everything))
         return;
-    reset();
-    perform(GetParam(), "strace -qq -s 200 -o /run/trace");
-    // A call, its number, the call before the one before; getrandom is not called in every run.
-    run("awk -F '(' 'BEGIN {p = q = \"-\"} {n = ++numbers[$1]} /]: end\"/ {inside = 0} "
-        "inside && /^[a-z]/ && !/^getrandom/ {print $1, n, q; q = p; p = $1} "
-        "/]: begin\"/ {inside = 1}' /run/trace >/run/calls");
-    std::ifstream calls("/run/calls");
+    std::istringstream calls(calls_of(GetParam()));
     size_t kills = 0;
     size_t not_reached = 0;
     for (std::string call, nth, last_but_one; calls >> call >> nth >> last_but_one; kills++) {
@@ -186,13 +200,8 @@ TEST_P(Faults, KeepThePromises) {
             const Done done = perform(GetParam(), "strace -f --seccomp-bpf" + strace +
                                                       "error=" + std::to_string(error));
             expect_documented(done, error, call);
-            if (!is_tool || call != "rename" || (everything && error != EIO))
-                continue;
-            const std::string trace = read_file("/run/trace");
-            const size_t end = trace.rfind("\") =");
-            const size_t start = trace.rfind('/', end) + 1;
-            const std::string &text = done.output.text;
-            renames += trace.substr(start, end - start) + text.substr(text.rfind(' '));
+            if (is_tool && call == "rename" && !(everything && error != EIO))
+                renames += failed_rename(done);
         }
     }
     EXPECT_LE(not_reached, 3U); // the surrogate parent's answers come in more or fewer pieces

@@ -161,7 +161,7 @@ static void trickle(int connection, const std::string &text) {
 }
 
 void ScriptedSurrogate::converse(int connection) {
-    if (then_ == Then::close_at_once || !await(connection, 2))
+    if (!await(connection, 2))
         return;
     while (unit::say(connection, reply_) && then_ == Then::flood)
         continue;

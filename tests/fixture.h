@@ -53,13 +53,11 @@ void fail_nanosleep(int nth, int error);
 class ScriptedSurrogate {
   public:
     enum class Then {
-        close,        // close the connection
-        hold,         // keep it open until the client closes
-        await_start,  // wait for "start\n", send `output`, close
-        await_kill,   // wait for "start\n", send `output`, then wait for "kill\n" or the client's
-                      // close
-        flood,        // send `reply` over and over until the client closes
-        close_at_once // close without reading or sending anything
+        close,       // close the connection
+        hold,        // keep it open until the client closes
+        await_start, // wait for "start\n", send `output`, close
+        await_kill,  // wait for "start\n", send `output`, then for "kill\n" or the client's close
+        flood        // send `reply` over and over until the client closes
     };
     ScriptedSurrogate(std::string reply, Then then, std::string output = "");
     ~ScriptedSurrogate();

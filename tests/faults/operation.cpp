@@ -21,11 +21,6 @@
 #define REAL(name) __libc_##name
 #endif
 #define NEXT(name) reinterpret_cast<decltype(&(name))>(dlsym(RTLD_NEXT, #name))
-#define OPERATION(name, call)                                                                      \
-    {                                                                                              \
-#name, [] { return static_cast<long>(call); }                                              \
-    }
-
 static long requests, failing, blocks, started;
 
 static bool refuse() {
@@ -77,6 +72,7 @@ static vlsys_gw6 gw6 = {"eth0", "2001:db8::1", 1};
 static char text[VLSYS_HOSTNAME_SIZE];
 static time_t when;
 
+#define OPERATION(name, call) {#name, [] { return static_cast<long>(call); }}
 static const struct Operation { const char *name; long (*run)(); } operations[] = {
     OPERATION(init, (started = vlsys_init()) != 0 ? started : vlsys_get_path_data(nullptr, 0)),
     OPERATION(set_netif, vlsys_set_netif("eth0", &off)),
