@@ -6,7 +6,9 @@
 // at "start", its output sent as it comes and after it the wait status; "kill" ends it. Any other
 // is run, and its wait status sent. A request cut short is not run.
 #include "unit/loopback.h"
+#include "vlsys/core/owners.h"
 
+#include <array>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
@@ -14,12 +16,15 @@
 #include <cstring>
 #include <fcntl.h>
 #include <poll.h>
+#include <spawn.h>
 #include <string>
 #include <sys/socket.h>
 #include <sys/wait.h>
+#include <thread>
 #include <unistd.h>
 
 using unit::say;
+using vlsys::Fd;
 
 static void say_number(int connection, int number) {
     say(connection, std::to_string(number) + "\n");
@@ -44,25 +49,30 @@ static bool take_suffix(std::string *command, const char *suffix) {
     return true;
 }
 
-[[noreturn]] static void execute(const std::string &directory, const std::string &command) {
-    signal(SIGPIPE, SIG_DFL);
-    if (chdir(directory.c_str()) == 0)
-        execl("/bin/sh", "sh", "-c", command.c_str(), nullptr);
-    _exit(127);
-}
-
+// Starts the command without copying this process, which would take longer than most commands do.
 static pid_t start(const std::string &directory, const std::string &command) {
-    const pid_t child = fork();
-    if (child == 0)
-        execute(directory, command);
-    return child;
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_addchdir_np(&actions, directory.c_str());
+    const std::array<const char *, 4> words = {"sh", "-c", command.c_str(), nullptr};
+    pid_t child = -1;
+    const int error = posix_spawn(&child, "/bin/sh", &actions, nullptr,
+                                  const_cast<char *const *>(words.data()), environ);
+    posix_spawn_file_actions_destroy(&actions);
+    return error == 0 ? child : -1;
 }
 
 static int wait_for(pid_t child) {
-    int status = 0;
-    while (waitpid(child, &status, 0) < 0 && errno == EINTR)
+    int status = 127 << 8; // as of a shell that could not be started
+    while (child > 0 && waitpid(child, &status, 0) < 0 && errno == EINTR)
         continue;
     return status;
+}
+
+[[noreturn]] static void execute(const std::string &directory, const std::string &command) {
+    if (chdir(directory.c_str()) == 0)
+        execl("/bin/sh", "sh", "-c", command.c_str(), nullptr);
+    _exit(127);
 }
 
 // Starts the command in a process group of its own, held back until a byte comes down the gate.
@@ -98,50 +108,60 @@ static void stream(int connection, int output, pid_t child) {
 }
 
 static void run_piped(int connection, const std::string &directory, const std::string &command) {
-    int gate[2];
-    int output[2];
-    if (pipe2(gate, O_CLOEXEC) != 0 || pipe2(output, O_CLOEXEC) != 0)
+    int ends[2];
+    if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) != 0)
         return;
-    const pid_t child = start_behind(gate[0], output[1], directory, command);
-    close(gate[0]);
-    close(output[1]);
+    Fd childs_gate(ends[0]);
+    const Fd gate(ends[1]);
+    if (pipe2(ends, O_CLOEXEC) != 0)
+        return;
+    const Fd output(ends[0]);
+    Fd childs_output(ends[1]);
+    const pid_t child = start_behind(childs_gate.get(), childs_output.get(), directory, command);
+    if (child < 0)
+        return;
+    childs_gate.reset();
+    childs_output.reset();
     say_number(connection, child);
     std::string line;
-    if (read_line(connection, &line) && line == "start" && write(gate[1], "", 1) == 1)
-        stream(connection, output[0], child);
-    close(gate[1]);
+    if (read_line(connection, &line) && line == "start" && say(gate.get(), "\n"))
+        stream(connection, output.get(), child);
+    else
+        kill(-child, SIGTERM);
     say_number(connection, wait_for(child));
     shutdown(connection, SHUT_WR);
     while (read_line(connection, &line))
         continue;
 }
 
-static void serve(int connection) {
+static void serve(int accepted) {
+    const Fd connection(accepted);
     std::string directory;
     std::string command;
-    if (!read_line(connection, &directory) || !read_line(connection, &command))
+    if (!read_line(accepted, &directory) || !read_line(accepted, &command))
         return;
-    if (take_suffix(&command, " &"))
-        say_number(connection, start(directory, command));
-    else if (take_suffix(&command, " |"))
-        run_piped(connection, directory, command);
-    else
-        say_number(connection, wait_for(start(directory, command)));
+    if (take_suffix(&command, " |")) {
+        run_piped(accepted, directory, command);
+        return;
+    }
+    const bool background = take_suffix(&command, " &");
+    const pid_t child = start(directory, command);
+    if (background) {
+        say_number(accepted, child);
+        shutdown(accepted, SHUT_RDWR); // the client need not wait for the command's end
+    }
+    const int status = wait_for(child);
+    if (!background)
+        say_number(accepted, status);
 }
 
 int main() {
     const int listener = unit::listen_on_loopback();
     if (daemon(1, 1) != 0)
         return 1;
-    signal(SIGPIPE, SIG_IGN);
     for (;;) {
         const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
-        if (connection >= 0 && fork() == 0) {
-            serve(connection);
-            _exit(0);
-        }
-        close(connection);
-        while (waitpid(-1, nullptr, WNOHANG) > 0)
-            continue;
+        if (connection >= 0)
+            std::thread(serve, connection).detach();
     }
 }
