@@ -28,9 +28,9 @@ static std::string key(int i) {
 }
 
 // An interface's file of `lines` lines, three levels down as on the appliance, and items that set
-// `count` of its keys, evenly spread.
+// `count` of its keys, evenly spread, or remove as many that it lacks.
 struct EditInput {
-    EditInput(int lines, int count) {
+    EditInput(int lines, int count, bool absent = false) {
         const char *const root = getenv("BENCH_DIRECTORY");
         path = std::string(root ? root : "/dev/shm") + "/etc/sysconfig/network-scripts/ifcfg-eth0";
         const vlsys::edit_item none = {};
@@ -39,9 +39,10 @@ struct EditInput {
             content += key(i) + "=a value of some length\n";
         std::ofstream(path) << content;
         for (int i = 0; i < count; i++)
-            keys.push_back(key(static_cast<int>(int64_t{i} * lines / count)));
+            keys.push_back(absent ? "KEY_" + std::to_string(i)
+                                  : key(static_cast<int>(int64_t{i} * lines / count)));
         for (const std::string &name : keys)
-            items.push_back({0, name.c_str(), "a value of some length"});
+            items.push_back({absent, name.c_str(), "a value of some length"});
     }
 
     std::string path;
@@ -50,8 +51,8 @@ struct EditInput {
     std::vector<vlsys::edit_item> items;
 };
 
-static void edit_ours(benchmark::State &state, int lines, int count) {
-    EditInput input(lines, count);
+static void edit_ours(benchmark::State &state, int lines, int count, bool absent) {
+    EditInput input(lines, count, absent);
     for (auto _ : state)
         if (vlsys::edit(input.path.c_str(), input.items.data(),
                         static_cast<uint32_t>(input.items.size())) != 0)
@@ -104,12 +105,14 @@ static void add(const std::string &name, Function *function, Arguments... argume
 }
 
 int main(int argc, char **argv) {
-    add("edit/12 items, 30 lines/ours", edit_ours, 30, 12);
+    add("edit/12 items, 30 lines/ours", edit_ours, 30, 12, false);
     add("edit/12 items, 30 lines/bare system calls", edit_bare, 30, 12);
     for (const int lines : {10, 100, 1000, 10000, 100000})
-        add("growth/lines/" + std::to_string(lines), edit_ours, lines, 10);
-    for (const int count : {1, 10, 100, 1000})
-        add("growth/items/" + std::to_string(count), edit_ours, 1000, count);
+        add("growth/lines/" + std::to_string(lines), edit_ours, lines, 10, false);
+    for (const int count : {1, 10, 100, 1000}) {
+        add("growth/items/" + std::to_string(count), edit_ours, 1000, count, false);
+        add("growth/absent items/" + std::to_string(count), edit_ours, 1000, count, true);
+    }
     add("log/syslog/ours", log_ours);
     add("log/syslog/syslog", log_syslog);
     add("stdout/printf/ours", log_ours);
