@@ -9,7 +9,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
-bool replace_bare(const char *path, const std::string &content) {
+bool replace_bare(const char *path, const std::string &content, bool early_mode) {
     static char buffer[1 << 16];
     std::string temporary = std::string(path) + "-XXXXXX";
     const mode_t mask = umask(077);
@@ -24,7 +24,7 @@ bool replace_bare(const char *path, const std::string &content) {
         good = written > 0;
         done += static_cast<size_t>(written);
     }
-    good = good && fchmod(out, 0644) == 0 && fsync(out) == 0;
+    good = good && (!early_mode || fchmod(out, 0644) == 0) && fsync(out) == 0;
     close(out);
     close(in);
     return good && rename(temporary.c_str(), path) == 0 && chmod(path, 0644) == 0;

@@ -1,8 +1,8 @@
 #!/usr/bin/python3
 """bench.py BUILD [ROW...]: runs the benchmarks and prints a table of ratios, ours / peer.
 
-Each row's two sides run in turn, on the same input, and the ratio is that of each pair of runs; the
-table has the minimum, median and maximum over the pairs. A ratio below 1 is in our favour. Rows that
+Each row's two sides run in turn (the calls of micro.cpp in random order), on the same input, and the
+ratio is that of each pair of runs; the table has the minimum, median and maximum over the pairs. A ratio below 1 is in our favour. Rows that
 need the unit run inside a stand-in unit (bench.py BUILD --inside ROW), with a system log that is
 read."""
 import ctypes
@@ -197,7 +197,7 @@ def row_tool():
         "ours": [BUILD / "factory/vlsys-factory"],
         "sed, ln, sync": [HERE / "files.sh", "each"],
         "the same, one sed": [HERE / "files.sh", "all"],
-        "systemd-firstboot": ["systemd-firstboot", f"--root={root}", "--timezone=Asia/Shanghai",
+        "systemd-firstboot": ["systemd-firstboot", f"--root={root}", "--timezone=Etc/GMT",
                               "--hostname=rhx416-41600123"],
     }
     environment = {"VL_ROOT": str(root), "ROOT": str(root)}
@@ -210,8 +210,9 @@ def row_tool():
             shutil.rmtree(root, ignore_errors=True)
             shutil.copytree(original, root)
             result = how(commands[name], **environment)
-            made[name] = {path: path.is_symlink() or path.read_text()
-                          for path in root.rglob("*") if not path.is_dir()}
+            made[name] = {path: os.readlink(path) if path.is_symlink()
+                          else (path.stat().st_mode, path.read_text())
+                          for path in root.rglob("*") if path.is_symlink() or path.is_file()}
             return result
 
         samples = alternate({name: lambda n=name: run(n) for name in commands})
@@ -385,7 +386,7 @@ def run_inside(name, unit):
     """Runs a row inside a unit whose log is read by a process that drops it."""
     out = subprocess.run(
         [BUILD / "unit/vlsys-unit", unit, "sh", "-c",
-         'unit-log >/dev/null & while [ ! -S /dev/log ]; do sleep 0.01; done; "$@"; kill $!', "-",
+         'unit-log >/dev/null & while [ ! -S /dev/log ]; do sleep 0.01; done; "$@"; status=$?; kill $!; exit $status', "-",
          sys.executable, "-B", __file__, BUILD, "--inside", name],
         stdout=subprocess.PIPE, check=True).stdout
     return json.loads(out)

@@ -59,10 +59,10 @@ static void edit_ours(benchmark::State &state, int lines, int count, bool absent
             state.SkipWithError("edit");
 }
 
-static void edit_bare(benchmark::State &state, int lines, int count) {
+static void edit_bare(benchmark::State &state, int lines, int count, bool early_mode) {
     EditInput input(lines, count);
     for (auto _ : state)
-        if (!replace_bare(input.path.c_str(), input.content))
+        if (!replace_bare(input.path.c_str(), input.content, early_mode))
             state.SkipWithError("replace_bare");
 }
 
@@ -106,7 +106,8 @@ static void add(const std::string &name, Function *function, Arguments... argume
 
 int main(int argc, char **argv) {
     add("edit/12 items, 30 lines/ours", edit_ours, 30, 12, false);
-    add("edit/12 items, 30 lines/bare system calls", edit_bare, 30, 12);
+    add("edit/12 items, 30 lines/bare system calls", edit_bare, 30, 12, false);
+    add("edit/12 items, 30 lines/the same, early mode", edit_bare, 30, 12, true);
     for (const int lines : {10, 100, 1000, 10000, 100000})
         add("growth/lines/" + std::to_string(lines), edit_ours, lines, 10, false);
     for (const int count : {1, 10, 100, 1000}) {

@@ -82,10 +82,14 @@ static pid_t start_behind(int gate, int output, const std::string &directory,
     setpgid(child, child); // in both, so that neither runs ahead of it
     if (child != 0)
         return child;
+    // While it is held back it must keep nothing open that other clients wait for the end of.
     dup2(output, STDOUT_FILENO);
+    dup2(gate, STDERR_FILENO + 1);
+    close_range(STDERR_FILENO + 2, ~0U, 0);
     char go = 0;
-    if (read(gate, &go, 1) != 1)
+    if (read(STDERR_FILENO + 1, &go, 1) != 1)
         _exit(127);
+    close(STDERR_FILENO + 1);
     execute(directory, command);
 }
 

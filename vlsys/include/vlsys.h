@@ -8,7 +8,8 @@
  * Setters change configuration files only, unless said otherwise. What they write takes effect at
  * the next network restart or boot. Rewriting a sysconfig file or the sysctl drop-in drops its
  * comments and empty lines, changes the first line of a key only, and makes a missing file and its
- * directories (mode 0755).
+ * directories (mode 0755). The clock file keeps its comments, has each of its zone lines changed,
+ * and must exist.
  *
  * Logging: every failed call is logged at LOG_ERR with a message that names the call, warnings at
  * LOG_WARNING, settings written and values read at LOG_INFO, traces at LOG_DEBUG. Each operation
