@@ -2,9 +2,9 @@
 """bench.py BUILD [ROW...]: runs the benchmarks and prints a table of ratios, ours / peer.
 
 Each row's two sides run in turn (the calls of micro.cpp in random order), on the same input, and the
-ratio is that of each pair of runs; the table has the minimum, median and maximum over the pairs. A ratio below 1 is in our favour. Rows that
-need the unit run inside a stand-in unit (bench.py BUILD --inside ROW), with a system log that is
-read."""
+ratio is that of each pair of runs; the table has the minimum, median and maximum over the pairs. A
+ratio below 1 is in our favour. Rows that need the unit run inside a stand-in unit (bench.py BUILD
+--inside ROW), with a system log that is read."""
 import ctypes
 import json
 import os
@@ -386,7 +386,8 @@ def run_inside(name, unit):
     """Runs a row inside a unit whose log is read by a process that drops it."""
     out = subprocess.run(
         [BUILD / "unit/vlsys-unit", unit, "sh", "-c",
-         'unit-log >/dev/null & while [ ! -S /dev/log ]; do sleep 0.01; done; "$@"; status=$?; kill $!; exit $status', "-",
+         'unit-log >/dev/null & while [ ! -S /dev/log ]; do sleep 0.01; done; "$@"; status=$?; kill $!; '
+         "exit $status", "-",
          sys.executable, "-B", __file__, BUILD, "--inside", name],
         stdout=subprocess.PIPE, check=True).stdout
     return json.loads(out)
