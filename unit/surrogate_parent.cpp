@@ -150,13 +150,13 @@ static void serve(int accepted) {
     }
     const bool background = take_suffix(&command, " &");
     const pid_t child = start(directory, command);
-    if (background) {
-        say_number(accepted, child);
-        shutdown(accepted, SHUT_RDWR); // the client need not wait for the command's end
+    if (!background) {
+        say_number(accepted, wait_for(child));
+        return;
     }
-    const int status = wait_for(child);
-    if (!background)
-        say_number(accepted, status);
+    say_number(accepted, child);
+    shutdown(accepted, SHUT_RDWR); // the client need not wait for the command's end
+    wait_for(child);
 }
 
 int main() {
