@@ -112,7 +112,9 @@ int WorkingList::build(std::span<const edit_item> items) {
 
 const WorkingList::Entry *WorkingList::take(std::string_view line) {
     for (Entry *entry = first_unused_; !entry->line.empty(); ++entry) {
-        if (entry->used || !starts_with(line, {entry->line.data(), entry->match}))
+        // Most keys differ in their first letter: no call for these.
+        if (entry->used || entry->line[0] != line[0] ||
+            !starts_with(line, {entry->line.data(), entry->match}))
             continue;
         entry->used = true;
         while (first_unused_->used)
