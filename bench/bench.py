@@ -195,8 +195,8 @@ def row_tool():
     root = UNIT_TMPFS / "root"
     commands = {
         "ours": [BUILD / "factory/vlsys-factory"],
-        "sed, ln, sync": [HERE / "files.sh", "each"],
-        "the same, one sed": [HERE / "files.sh", "all"],
+        "sed, ln, sync": [HERE / "factory_files.sh", "each"],
+        "the same, one sed": [HERE / "factory_files.sh", "all"],
         "systemd-firstboot": ["systemd-firstboot", f"--root={root}", "--timezone=Etc/GMT",
                               "--hostname=rhx416-41600123"],
     }
@@ -385,7 +385,7 @@ def row_system():
 def run_inside(name, unit):
     """Runs a row inside a unit whose log is read by a process that drops it."""
     out = subprocess.run(
-        [BUILD / "unit/vlsys-unit", unit, "sh", "-c",
+        [BUILD / "standin/vlsys-unit", unit, "sh", "-c",
          'unit-log >/dev/null & while [ ! -S /dev/log ]; do sleep 0.01; done; "$@"; status=$?; kill $!; '
          "exit $status", "-",
          sys.executable, "-B", __file__, BUILD, "--inside", name],

@@ -1,6 +1,6 @@
 #include "fixture.h"
 
-#include "unit/sandbox.h"
+#include "standin/sandbox.h"
 
 #include <sys/stat.h>
 #include <unistd.h>

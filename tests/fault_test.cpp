@@ -2,7 +2,7 @@
 // system call fails once, every allocation fails once (see faults/operation.cpp).
 #include "core/text.h"
 #include "fixture.h"
-#include "unit/sandbox.h"
+#include "standin/sandbox.h"
 
 #include <algorithm>
 #include <filesystem>

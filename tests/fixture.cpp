@@ -1,7 +1,7 @@
 #include "fixture.h"
 
-#include "unit/log.h"
-#include "unit/loopback.h"
+#include "standin/log.h"
+#include "standin/loopback.h"
 #include "vlsys.h"
 
 #include <algorithm>

@@ -1,9 +1,9 @@
 // What the tests share: files, the captured log, counted waits, a scripted surrogate parent.
 // Every test process runs in namespaces of its own with the stand-in unit's files and interfaces;
-// /run is the place for files of a test's own (see unit/sandbox.h for what else can be written).
+// /run is the place for files of a test's own (see standin/sandbox.h for what else can be written).
 #pragma once
 
-#include "unit/sandbox.h"
+#include "standin/sandbox.h"
 
 #include <gtest/gtest.h>
 

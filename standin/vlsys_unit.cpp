@@ -1,7 +1,7 @@
 // vlsys-unit KIND COMMAND [ARGUMENT...]: runs a command inside a stand-in unit.
 // vlsys-unit --list: the kinds of unit.
-#include "unit/kinds.h"
-#include "unit/sandbox.h"
+#include "standin/kinds.h"
+#include "standin/sandbox.h"
 
 #include <cstdio>
 #include <cstring>

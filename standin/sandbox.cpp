@@ -1,6 +1,6 @@
-#include "unit/sandbox.h"
+#include "standin/sandbox.h"
 
-#include "unit/kinds.h"
+#include "standin/kinds.h"
 
 #include <cerrno>
 #include <csignal>

@@ -1,4 +1,4 @@
-#include "unit/loopback.h"
+#include "standin/loopback.h"
 
 #include <arpa/inet.h>
 #include <cstdio>

@@ -1,4 +1,4 @@
-#include "unit/log.h"
+#include "standin/log.h"
 
 #include <cstdio>
 #include <cstdlib>

@@ -1,4 +1,4 @@
-#include "unit/kinds.h"
+#include "standin/kinds.h"
 
 #include <cstring>
 #include <iterator>

@@ -1,6 +1,6 @@
 // The unit's system log: prints what is sent to /dev/log, "<level> <text>" per message, until
 // SIGTERM; by then all that was sent before is printed.
-#include "unit/log.h"
+#include "standin/log.h"
 
 #include <csignal>
 #include <cstdio>

@@ -5,7 +5,7 @@
 // started, and its process id sent; one that ends in " |" is announced with its process id, started
 // at "start", its output sent as it comes and after it the wait status; "kill" ends it. Any other
 // is run, and its wait status sent. A request cut short is not run.
-#include "unit/loopback.h"
+#include "standin/loopback.h"
 #include "vlsys/core/owners.h"
 
 #include <array>

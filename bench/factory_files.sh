@@ -1,5 +1,5 @@
 #!/bin/sh
-# files.sh each|all: makes the files of a factory set-up under the directory in ROOT with sed, ln and
+# factory_files.sh each|all: makes the files of a factory set-up under the directory in ROOT with sed, ln and
 # sync: a sed for each interface's file, or one for all of them.
 set -eu
 scripts=$ROOT/etc/sysconfig/network-scripts
