@@ -22,7 +22,7 @@ TEST_F(Core, PathsComeFromTheEnvironmentAtTheStart) {
         for (size_t i = 0; i < 3; i++)
             values[i] ? setenv(names[i], values[i], 1) : unsetenv(names[i]);
         ASSERT_EQ(vlsys_init(), 0);
-        EXPECT_TRUE(take_log().starts_with("6 vlsys 1.0.0 "));
+        EXPECT_TRUE(take_log().starts_with("6 vlsys " VLSYS_VERSION " "));
         setenv("VL_ROOT", "/changed", 1);
         EXPECT_EQ(vlsys_init(), 0);
         EXPECT_EQ(take_log(), "7 initialized 1 times\n");

@@ -1,7 +1,10 @@
+#include "core/log.h"
+
 #include "core/owners.h"
-#include "vlsys.h"
 
 #include <cstring>
+
+#undef vlsys_log
 
 namespace vlsys {
 
@@ -11,12 +14,26 @@ static uint32_t log_mask = 0xFF; // standard-output mode only: bit p set prints 
 static constexpr const char *level_names[] = {"EMERG", "ALERT",  "CRIT", "ERR",
                                               "WARN",  "NOTICE", "INFO", "DEBUG"};
 
+namespace {
+
+// Keeps other threads from standard output, so that a line stays whole and its prefix true.
+class StdoutLock {
+  public:
+    StdoutLock() { flockfile(stdout); }
+    StdoutLock(const StdoutLock &) = delete;
+    StdoutLock &operator=(const StdoutLock &) = delete;
+    ~StdoutLock() { funlockfile(stdout); }
+};
+
+} // namespace
+
 VLSYS_PRINTF(2, 0)
 static void log_to_stdout(int priority, const char *format, va_list arguments) {
     const SavedErrno caller;
     const int level = LOG_PRI(priority);
     if ((log_mask & static_cast<uint32_t>(LOG_MASK(level))) == 0)
         return;
+    const StdoutLock whole_line;
     if (priority != LOG_DEBUG)
         printf("%s[%d]: <%s>: [%d]: ", log_ident, getpid(), level_names[level], gettid());
     errno = caller.value(); // for "%m"
@@ -40,6 +57,21 @@ static void log_to_system(int priority, const char *format, va_list arguments) {
         vsyslog(priority, format, again);
     }
     va_end(again);
+}
+
+int log_errno(const char *format, ...) {
+    const SavedErrno reason;
+    char with_reason[256];
+    snprintf(with_reason, sizeof with_reason, "%s: %%m", format);
+    va_list arguments;
+    va_start(arguments, format);
+    errno = reason.value(); // for "%m"
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral" // the caller's format was checked
+    vlsys_vlog(LOG_ERR, with_reason, arguments);
+#pragma GCC diagnostic pop
+    va_end(arguments);
+    return -reason.value();
 }
 
 } // namespace vlsys

@@ -1,6 +1,60 @@
 #include "core/paths.h"
 
+#include "core/log.h"
+#include "core/owners.h"
+
+#include <cstring>
+
 namespace vlsys {
+
+static Text path_root;
+static Text path_prefix;
+static Text path_data;
+
+static const char *environment(const char *name, const char *fallback) {
+    const char *value = getenv(name);
+    return value ? value : fallback;
+}
+
+static int join(Text &path, const char *root, const char *rest, const char *failure) {
+    const size_t size = strlen(root) + strlen(rest) + 1;
+    path.reset(static_cast<char *>(malloc(size)));
+    if (!path)
+        return log_errno("%s", failure);
+    vlsys_strlcpy(path.get(), root, size);
+    vlsys_strlcat(path.get(), rest, size);
+    return 0;
+}
+
+int set_up_paths() {
+    const char *root = environment("VL_ROOT", "");
+    const char *prefix = environment("VL_PREFIX", "/usr");
+    const char *data = environment("VL_DATA", "/velmora");
+
+    path_root.reset(strdup(root));
+    if (!path_root)
+        return log_errno("%s", "strdup(path_root)");
+    const int result = join(path_prefix, root, prefix, "malloc(path_prefix)");
+    if (result < 0)
+        return result;
+    return join(path_data, root, data, "malloc(path_data)");
+}
+
+void drop_paths() {
+    path_root.reset();
+    path_prefix.reset();
+    path_data.reset();
+}
+
+static int64_t get_path(const Text &path, char *buffer, size_t size) {
+    if (!path)
+        return VLSYS_NOT_STARTED;
+    if (!buffer)
+        return static_cast<int64_t>(strlen(path.get()));
+    if (size == 0)
+        return 0;
+    return static_cast<int64_t>(vlsys_strlcpy(buffer, path.get(), size));
+}
 
 SystemPath::SystemPath(const char *fixed, const char *name) {
     text[0] = '\0'; // the getter writes nothing before the library is started
@@ -10,3 +64,17 @@ SystemPath::SystemPath(const char *fixed, const char *name) {
 }
 
 } // namespace vlsys
+
+using namespace vlsys;
+
+int64_t vlsys_get_path_root(char *buffer, size_t size) {
+    return get_path(path_root, buffer, size);
+}
+
+int64_t vlsys_get_path_prefix(char *buffer, size_t size) {
+    return get_path(path_prefix, buffer, size);
+}
+
+int64_t vlsys_get_path_data(char *buffer, size_t size) {
+    return get_path(path_data, buffer, size);
+}

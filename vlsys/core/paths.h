@@ -5,6 +5,11 @@
 
 namespace vlsys {
 
+// Makes the root, prefix and data paths of the environment. Returns 0 or the negated errno, logged;
+// what was made before the failure stays until drop_paths.
+int set_up_paths();
+void drop_paths();
+
 // Under the root path.
 inline constexpr char localtime_path[] = "/etc/localtime";   // link to the zone file
 inline constexpr char clock_path[] = "/etc/sysconfig/clock"; // ZONE

@@ -7,6 +7,7 @@
 #include <climits>
 #include <cstring>
 #include <fcntl.h>
+#include <sys/xattr.h>
 #include <utility>
 
 namespace vlsys {
@@ -21,26 +22,21 @@ Replacement::~Replacement() {
 int Replacement::create(const char *path, char separator) {
     path_ = path;
     Text name = format_text("%s%cXXXXXX", path, separator);
-    if (!name) {
-        vlsys_log(LOG_ERR, "asprintf(\"%%s%cXXXXXX\", %s): %m", separator, path);
-        return -errno;
-    }
+    if (!name)
+        return log_errno("asprintf(\"%%s%cXXXXXX\", %s)", separator, path);
     {
         const SavedUmask mask(077);
         fd_.reset(mkostemp(name.get(), O_CLOEXEC));
     }
-    if (!fd_) {
-        vlsys_log(LOG_ERR, "mkstemp(%s): %m", name.get());
-        return -errno;
-    }
+    if (!fd_)
+        return log_errno("mkstemp(%s)", name.get());
     temporary_ = std::move(name);
     return 0;
 }
 
 static int write_failed(std::string_view bytes) {
-    vlsys_log(LOG_ERR, "fputs(%.*s): %m", static_cast<int>(std::min<size_t>(bytes.size(), INT_MAX)),
-              bytes.data());
-    return -errno;
+    return log_errno("fputs(%.*s)", static_cast<int>(std::min<size_t>(bytes.size(), INT_MAX)),
+                     bytes.data());
 }
 
 int Replacement::write(std::string_view bytes) {
@@ -69,29 +65,40 @@ bool Replacement::write_all(std::string_view bytes) const {
     return true;
 }
 
-int Replacement::commit(Flush to) {
+// Where files carry security labels, one without its own may be closed to those who need it.
+void Replacement::keep_security_label() const {
+    static constexpr char name[] = "security.selinux";
+    char label[256];
+    const ssize_t size = getxattr(path_, name, label, sizeof label);
+    if (size > 0 && fsetxattr(fd_.get(), name, label, static_cast<size_t>(size), 0) != 0)
+        log_errno("fsetxattr(%s, %s)", temporary_.get(), name);
+}
+
+// On some file systems there is nothing to flush.
+static bool flush_to_disk(int fd) {
+    return fsync(fd) == 0 || errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP;
+}
+
+int Replacement::commit() {
     if (!flush())
         return write_failed(last_);
+    keep_security_label();
     // A process killed right after the rename leaves the mode that the file has now.
     fchmod(fd_.get(), 0644);
-    if (to == Flush::to_disk && fsync(fd_.get()) != 0) {
-        vlsys_log(LOG_ERR, "fsync(%s): %m", temporary_.get());
-        return -errno;
-    }
-    fd_.reset();
-    if (rename(temporary_.get(), path_) != 0) {
-        vlsys_log(LOG_ERR, "rename(%s, %s): %m", temporary_.get(), path_);
-        return -errno;
-    }
+    if (!flush_to_disk(fd_.get()))
+        return log_errno("fsync(%s)", temporary_.get());
+    // A signal cuts the wait of a close short, but what was flushed is stored.
+    if (close(fd_.release()) != 0 && errno != EINTR)
+        return log_errno("close(%s)", temporary_.get());
+    if (rename(temporary_.get(), path_) != 0)
+        return log_errno("rename(%s, %s)", temporary_.get(), path_);
     temporary_.reset();
     return 0;
 }
 
 int Replacement::set_mode() const {
-    if (chmod(path_, 0644) != 0) {
-        vlsys_log(LOG_ERR, "chmod(%s): %m", path_);
-        return -errno;
-    }
+    if (chmod(path_, 0644) != 0)
+        return log_errno("chmod(%s)", path_);
     return 0;
 }
 

@@ -7,8 +7,6 @@
 
 namespace vlsys {
 
-enum class Flush { none, to_disk };
-
 // One file on its way to take another's place. Each step returns 0, or the negated errno after
 // logging its message. A temporary that was not committed is removed with its owner.
 class Replacement {
@@ -23,14 +21,15 @@ class Replacement {
     int create(const char *path, char separator);
     // Writes bytes, such as a line, by way of a buffer.
     int write(std::string_view bytes);
-    // Puts the new content in place of the old.
-    int commit(Flush to);
+    // Flushes the new content to disk and puts it in place of the old, with its security label.
+    int commit();
     // Sets the mode of the file in place to 0644.
     int set_mode() const;
 
   private:
     bool flush();
     bool write_all(std::string_view bytes) const;
+    void keep_security_label() const;
 
     const char *path_ = nullptr;
     Text temporary_; // name of the temporary while it exists

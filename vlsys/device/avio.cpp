@@ -63,7 +63,7 @@ static uint32_t parse_register(const char *text) {
 // Reads on to the next header, or the next register line that begins with the prefix.
 static bool next_line(FILE *file, std::string_view register_prefix, StatusLine *result) {
     char line[1024];
-    while (read_line(file, line, sizeof line)) {
+    while (read_line(file, line, sizeof line) > 0) {
         const std::string_view text = line;
         result->is_header = starts_with(text, header_prefix);
         if (result->is_header) {

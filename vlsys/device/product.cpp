@@ -22,7 +22,7 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
     char line[8192];
     char status_text[8] = "";
     size_t length = 0;
-    while (!ferror(stream) && read_line(stream, line, sizeof line)) {
+    while (!ferror(stream) && read_line(stream, line, sizeof line) > 0) {
         vlsys_log(LOG_DEBUG, "%s", line);
         char *rest = nullptr;
         const char *const key = strtok_r(line, " \t:\n", &rest);

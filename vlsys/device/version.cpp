@@ -19,7 +19,7 @@ static time_t modification_time(FILE *file) {
 
 static bool read_version(FILE *file, char *version, size_t size) {
     errno = 0; // an empty file is no error
-    if (!read_line(file, version, size)) {
+    if (read_line(file, version, size) <= 0) {
         vlsys_log(LOG_ERR, "fgets(%s): %m", version_path);
         return false;
     }

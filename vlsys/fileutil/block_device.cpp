@@ -14,7 +14,7 @@ int64_t read_block_size(FILE *file) {
     constexpr int64_t sector_size = 512;
     constexpr int64_t sector_limit = INT64_MAX / sector_size;
     char line[64];
-    if (!read_line(file, line, sizeof line))
+    if (read_line(file, line, sizeof line) <= 0)
         return 0;
     const unsigned long long sectors = strtoull(line, nullptr, 10);
     return sectors < sector_limit ? static_cast<int64_t>(sectors) * sector_size : INT64_MAX;

@@ -60,6 +60,15 @@ extern "C" {
 #define VLSYS_ADDR6_COUNT 4 /* IPv6 addresses of an interface record */
 #define VLSYS_DNS_COUNT 3   /* name servers of a DNS record */
 
+/* ---- Version ----------------------------------------------------------------------------------
+ */
+
+/* Of this header. A program that was built with it runs with any later library of the same major.
+ */
+#define VLSYS_VERSION_MAJOR 1
+#define VLSYS_VERSION_MINOR 1
+#define VLSYS_VERSION "1.1.0"
+
 /* ---- Start-up and paths ---------------------------------------------------------------------- */
 
 /*
@@ -85,9 +94,10 @@ VLSYS_API void vlsys_exit(void);
  * Copies the path into the buffer of `size` bytes, cut to size - 1 bytes and NUL-terminated.
  *
  * Returns the length of the whole path, also when it was cut or the buffer is null (nothing is
- * written); 0 when the size is 0 (nothing is written); -200 when the library is not started. Logs
- * nothing.
+ * written); 0 when the size is 0 (nothing is written); VLSYS_NOT_STARTED (-200) when the library is
+ * not started. Logs nothing.
  */
+#define VLSYS_NOT_STARTED (-200)
 VLSYS_API int64_t vlsys_get_path_root(char *buffer, size_t size);
 VLSYS_API int64_t vlsys_get_path_prefix(char *buffer, size_t size);
 VLSYS_API int64_t vlsys_get_path_data(char *buffer, size_t size);

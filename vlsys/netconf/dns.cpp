@@ -96,7 +96,7 @@ static int set_dns_of(const char *name, const vlsys_dns &dns, const DnsTexts &te
 static void read_resolver(FILE *file, vlsys_dns *dns) {
     int servers = 0;
     char line[256];
-    while (read_line(file, line, sizeof line)) {
+    while (read_line(file, line, sizeof line) > 0) {
         if (line[0] == '#' || line[0] == ';' || line[0] == '\n')
             continue;
         char *rest = nullptr;
@@ -121,7 +121,7 @@ static int read_dns_of(const char *name, DnsSettings *settings) {
     *settings = {};
     char line[256];
     Setting setting;
-    while (next_setting(file.get(), line, sizeof line, Quotes::keep, &setting)) {
+    while (next_setting(file.get(), line, sizeof line, Quotes::keep, &setting) > 0) {
         settings->peerdns_no |=
             strcmp(setting.key, "PEERDNS") == 0 && strcmp(setting.value, "no") == 0;
         settings->has_domain |= strcmp(setting.key, "DOMAIN") == 0;

@@ -233,7 +233,7 @@ int edit(const char *path, const edit_item *items, uint32_t count) {
     if (result == 0)
         result = write_new(&old, &list, &replacement);
     if (result == 0)
-        result = replacement.commit(Flush::to_disk);
+        result = replacement.commit();
     if (result == 0)
         result = replacement.set_mode();
     return result;

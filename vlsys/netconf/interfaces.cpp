@@ -18,6 +18,16 @@ using Index = std::unique_ptr<struct if_nameindex, FreeIndex>;
 
 } // namespace
 
+int find_interface(const char *name) {
+    const unsigned int index = if_nametoindex(name);
+    if (index == 0)
+        return errno == ENODEV ? -ENXIO : log_errno("if_nametoindex(%s)", name);
+    char own_name[IF_NAMESIZE];
+    if (!if_indextoname(index, own_name))
+        return errno == ENXIO ? -ENXIO : log_errno("if_indextoname(%u)", index);
+    return strcmp(name, own_name) == 0 ? 0 : -ENXIO;
+}
+
 bool is_virtual_bridge(const char *name) {
     return strncmp(name, "virbr", 5) == 0;
 }

@@ -21,6 +21,11 @@ class InterfaceList {
     Owned<InterfaceName[]> names_;
 };
 
+// Whether the kernel has an interface of that very name. It also finds one by an alternative name,
+// and looks at a name up to its colon only ("eth0:/../../x"): neither counts.
+// Returns 0; -ENXIO when there is none (silent); else the negated errno of the look-up, logged.
+int find_interface(const char *name);
+
 // Whether the name is one of the virtual bridges, virbr*.
 bool is_virtual_bridge(const char *name);
 

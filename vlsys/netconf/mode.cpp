@@ -68,7 +68,7 @@ static Settings read_settings(FILE *file) {
     Settings settings = {};
     char line[256];
     Setting setting;
-    while (next_setting(file, line, sizeof line, Quotes::remove, &setting)) {
+    while (next_setting(file, line, sizeof line, Quotes::remove, &setting) > 0) {
         const auto is = [&](const char *key) { return strcmp(setting.key, key) == 0; };
         const auto has = [&](const char *value) { return strcmp(setting.value, value) == 0; };
         settings.onboot |= is("ONBOOT") && has("yes");

@@ -23,7 +23,7 @@ static void get_sysconfig_hostname(char (&hostname)[VLSYS_HOSTNAME_SIZE]) {
     }
     char line[VLSYS_HOSTNAME_SIZE + sizeof "HOSTNAME=\n" - 1];
     Setting setting;
-    while (next_setting(file.get(), line, sizeof line, Quotes::remove, &setting)) {
+    while (next_setting(file.get(), line, sizeof line, Quotes::remove, &setting) > 0) {
         if (strcmp(setting.key, "HOSTNAME") == 0) {
             vlsys_strlcpy(hostname, setting.value, sizeof hostname);
             return;

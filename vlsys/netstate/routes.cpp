@@ -66,7 +66,7 @@ int read_ipv6_gateway(FILE *table, vlsys_gw6 *gw) {
     constexpr uint32_t needed = RTF_UP | RTF_GATEWAY;
 
     char line[line_size];
-    while (read_line(table, line, sizeof line)) {
+    while (read_line(table, line, sizeof line) > 0) {
         const Fields<count> fields(line, " \t\n");
         if (!fields.text[next_hop] || fields.text[destination] != any ||
             (fields.hex(flags, 0) & needed) != needed)
@@ -97,7 +97,7 @@ int read_ipv4_gateway(FILE *table, vlsys_gw4 *gw) {
     enum { interface = 0, destination = 1, gateway = 2, mask = 7, count };
 
     char line[line_size];
-    while (read_line(table, line, sizeof line)) {
+    while (read_line(table, line, sizeof line) > 0) {
         const Fields<count> fields(line, " \t");
         if (fields.hex(mask, UINT32_MAX) != 0 || fields.hex(destination, UINT32_MAX) != 0)
             continue;
@@ -117,7 +117,7 @@ int read_ipv4_gateway(FILE *table, vlsys_gw4 *gw) {
 static bool names_gateway(FILE *network) {
     bool found = false;
     char line[line_size];
-    while (read_line(network, line, sizeof line))
+    while (read_line(network, line, sizeof line) > 0)
         found |= starts_with(line, "GATEWAY=");
     return found;
 }
@@ -126,7 +126,7 @@ static bool learns_gateway(FILE *ifcfg) {
     bool dhcp = false;
     bool refused = false;
     char line[line_size];
-    while (read_line(ifcfg, line, sizeof line)) {
+    while (read_line(ifcfg, line, sizeof line) > 0) {
         dhcp |= starts_with(line, "BOOTPROTO=dhcp");
         refused |= starts_with(line, "DEFROUTE=no");
     }

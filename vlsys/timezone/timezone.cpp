@@ -140,7 +140,7 @@ static int set_clock_zone(const char *zone) {
     }
     result = rewrite_clock(clock.get(), path.text, zone_line.get(), &replacement);
     if (result == 0)
-        result = replacement.commit(Flush::none);
+        result = replacement.commit();
     if (result != 0)
         return result;
     replacement.set_mode(); // the zone is stored, whatever the mode
