@@ -1,59 +1,44 @@
-"""The rules of the validators of a network setting with Python's ipaddress: the interface exists, its
-address is a host's in its subnet, no two subnets overlap, gateway and servers lie in one of them."""
+"""The validators' peer: the same rules with Python's ipaddress. Each interface exists, its address
+is a host's in its subnet, no two subnets overlap, and gateway and servers lie in one of them."""
 import ipaddress
 import socket
 
 
-def check_interfaces(settings):
-    found = []
-    for name, address, prefix, address6, prefix6 in settings:
-        socket.if_nametoindex(name)
-        pair = []
-        for text, length in ((address, prefix), (address6, prefix6)):
-            own = ipaddress.ip_interface(f"{text}/{length}")
-            if own.is_loopback or own.is_multicast or own.ip == own.network.network_address:
-                raise ValueError(text)
-            if own.version == 4 and own.ip == own.network.broadcast_address:
-                raise ValueError(text)
-            pair.append(own)
-        found.append(pair)
-    return found
+def check_host(address, network):
+    no_host = address == network.network_address or (
+        network.version == 4 and address == network.broadcast_address)
+    if no_host or address.is_loopback or address.is_multicast:
+        raise ValueError(address)
 
 
-def check_pairs(interfaces):
-    for i, a in enumerate(interfaces):
-        for j, b in enumerate(interfaces):
-            if i != j and b.ip in a.network:
-                raise ValueError(f"{a} and {b} have overlapped")
+def own_interface(name, text):
+    socket.if_nametoindex(name)
+    own = ipaddress.ip_interface(text)
+    check_host(own.ip, own.network)
+    return own
+
+
+def check_overlap(interfaces):
+    for a in interfaces:
+        if any(b.ip in a.network for b in interfaces if b is not a):
+            raise ValueError(a)
 
 
 def check_reach(interfaces, text):
     address = ipaddress.ip_address(text)
-    inside = False
-    for own in interfaces:
-        if address in own.network:
-            if address in (own.network.network_address, own.network.broadcast_address):
-                raise ValueError(text)
-            inside = True
-    if not inside:
-        raise ValueError(text)
+    networks = [own.network for own in interfaces if address in own.network]
+    if not networks:
+        raise ValueError(address)
+    for network in networks:
+        check_host(address, network)
 
 
-def check_one(setting, gateway, gateway6, servers):
-    """As vlsys_address_check."""
-    [(own, own6)] = check_interfaces([setting])
-    check_reach([own], gateway)
-    check_reach([own6], gateway6)
-    for server in servers:
-        check_reach([own], server)
-
-
-def check_all(settings, gateway, gateway6, servers):
-    """As vlsys_address_check2."""
-    found = check_interfaces(settings)
-    for family, gateway_text in ((0, gateway), (1, gateway6)):
-        interfaces = [pair[family] for pair in found]
-        check_pairs(interfaces)
-        check_reach(interfaces, gateway_text)
-    for server in servers:
-        check_reach([pair[0] for pair in found], server)
+def check(count):
+    """Checks the setting of so many interfaces that calls.cpp checks too."""
+    ipv4 = [own_interface(f"eth{i}", f"10.{i // 256}.{i % 256}.2/24") for i in range(count)]
+    ipv6 = [own_interface(f"eth{i}", f"fd00:{i:x}::2/64") for i in range(count)]
+    check_overlap(ipv4)
+    check_overlap(ipv6)
+    check_reach(ipv6, "fd00:0::1")
+    for text in ("10.0.0.1", "10.0.0.3", "10.0.0.4"):
+        check_reach(ipv4, text)
