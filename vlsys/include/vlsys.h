@@ -850,6 +850,60 @@ VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys
 VLSYS_API int vlsys_address_check2(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *gw6,
                                    vlsys_dns *dns, char *hostname);
 
+/*
+ * A check code in words, such as "eth1: the IPv4 netmask has a gap", cut to a buffer of `size`
+ * bytes, which may be null. The `count` interfaces are those that were checked, or null: the text
+ * then says "interface 2" in place of a name. It names an interface only where the code concerns
+ * one: an overlap, for one, is found between two, and its code does not say which.
+ * VLSYS_CHECK_FIELD_IPV6_ADDR is also the third DNS server's field: the text says "third DNS
+ * server" where the kind of fault, or an interface without a fixed IPv6 address, tells it is that.
+ *
+ * Every other result of the validators and of vlsys_set_network has a text, too: "no fault" for 0,
+ * "error <number>: " and the system's text for an errno or a negative resolver code.
+ *
+ * Returns the length of the whole text: it was cut when that is `size` or more. Logs nothing.
+ */
+VLSYS_API size_t vlsys_check_text(int code, const vlsys_ifconf *nifs, int count, char *buffer,
+                                  size_t size);
+
+/* ---- Applying a whole network setting -------------------------------------------------------- */
+
+/* Steps of vlsys_set_network. */
+#define VLSYS_STEP_NONE 0         /* all went well */
+#define VLSYS_STEP_CHECK 1        /* the setting is refused, nothing was written */
+#define VLSYS_STEP_NETIF 2        /* vlsys_set_netif, of each interface in turn */
+#define VLSYS_STEP_IPV4_GATEWAY 3 /* vlsys_set_ipv4_default_gateway2 */
+#define VLSYS_STEP_IPV6_GATEWAY 4 /* vlsys_set_ipv6_default_gateway2 */
+#define VLSYS_STEP_DNS 5          /* vlsys_set_dns_settings */
+#define VLSYS_STEP_HOSTNAME 6     /* vlsys_set_hostname */
+
+/*
+ * Checks the network setting of `count` interfaces with vlsys_address_check2 and writes it with the
+ * setters, in the order of the steps above. This is the safe way to set what a person or another
+ * program asked for: the setters write what they are given into files that scripts run as root, and
+ * no text that the check did not look at reaches them.
+ *
+ * - A mode that its field does not have is refused: above VLSYS_MODE_AUTO for IPv6 and the IPv6
+ *   gateway, above VLSYS_MODE_DHCP for IPv4, the IPv4 gateway and DNS.
+ * - After the check, every field that the modes leave unread is cleared in the caller's records:
+ *   addr, netmask, broadaddr and prefix of an interface whose IPv4 is not Manual; addr6[0] when its
+ *   IPv6 is not; a gateway's addr when it is not Manual; domain and servers when DNS is not, and
+ *   its iface when it is Off.
+ * - DNS servers move up where the check has emptied one. The first two are written.
+ * - The first failure ends it; what was written before it stays.
+ *
+ * `step` may be null; it receives VLSYS_STEP_NONE, or the step that failed.
+ *
+ * Returns 0; a check code; 22 (EINVAL) for a mode that is refused (logged); 14 (EFAULT) for a null
+ * argument or a count below 1; else the positive errno of the check or of the setter that failed.
+ * Logs what the check and the setters log, and at LOG_WARNING each part of the setting that the
+ * check lets pass and the network scripts are known not to serve: a link-local address as the fixed
+ * IPv6 address, an IPv4 gateway outside every fixed subnet, and a global IPv6 gateway outside every
+ * fixed subnet, which the scripts set before the prefix is learnt. The result is 0 all the same.
+ */
+VLSYS_API int vlsys_set_network(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *gw6,
+                                vlsys_dns *dns, char *hostname, int *step);
+
 /* ---- Files and directories ------------------------------------------------------------------- */
 
 /*
