@@ -5,51 +5,43 @@
 
 namespace unit {
 
-// Alive registers: 0x13 is SY at 59.94i, 0x25 is CN at 50i; 0x41 is HDCP.
+static constexpr Board sy_at_59_94i = {.alive = 0x13};
+static constexpr Board cn_at_50i = {.alive = 0x25};
+static constexpr Board with_hdcp = {.alive = 0x41};
+
 const Kind kinds[] = {
-    {"sy",
-     "four boards ready, destination SY, 59.94i, HDCP",
-     true,
-     true,
-     true,
-     {{0, 0x13}, {0, 0x01}, {0, 0x41}, {0, 0x01}}},
-    {"cn",
-     "four boards ready, destination CN, 50i, no HDCP",
-     true,
-     true,
-     true,
-     {{0, 0x25}, {0, 0x01}, {0, 0x01}, {0, 0x01}}},
-    {"no-driver", "the video I/O driver is not loaded", true, true, false, {}},
-    {"no-surrogate",
-     "the surrogate parent does not run",
-     false,
-     true,
-     true,
-     {{0, 0x13}, {0, 0x01}, {0, 0x41}, {0, 0x01}}},
-    {"board-missing",
-     "TBX-206 is missing: a wait of 29 seconds",
-     true,
-     true,
-     true,
-     {{0, 0x13}, {0, 0x01}, {0, 0x41}, {0, -1}}},
-    {"board-not-alive",
-     "TBX-204 does not come up: a wait of 29 seconds",
-     true,
-     true,
-     true,
-     {{0, 0x13}, {0, 0}, {0, 0x41}, {0, 0x01}}},
-    {"backup-boot",
-     "TBX-205 booted from its backup image",
-     true,
-     true,
-     true,
-     {{0, 0x13}, {0, 0x01}, {1, 0x41}, {0, 0x01}}},
-    {"serial-fails",
-     "the serial number cannot be read",
-     true,
-     false,
-     true,
-     {{0, 0x13}, {0, 0x01}, {0, 0x41}, {0, 0x01}}},
+    {.name = "sy",
+     .description = "four boards ready, destination SY, 59.94i, HDCP",
+     .krd31 = sy_at_59_94i,
+     .tbx205 = with_hdcp},
+    {.name = "cn",
+     .description = "four boards ready, destination CN, 50i, no HDCP",
+     .krd31 = cn_at_50i},
+    {.name = "no-driver", .description = "the video I/O driver is not loaded", .driver = false},
+    {.name = "no-surrogate",
+     .description = "the surrogate parent does not run",
+     .surrogate = false,
+     .krd31 = sy_at_59_94i,
+     .tbx205 = with_hdcp},
+    {.name = "board-missing",
+     .description = "TBX-206 is missing: a wait of 29 seconds",
+     .krd31 = sy_at_59_94i,
+     .tbx205 = with_hdcp,
+     .tbx206 = {.alive = Board::missing}},
+    {.name = "board-not-alive",
+     .description = "TBX-204 does not come up: a wait of 29 seconds",
+     .krd31 = sy_at_59_94i,
+     .tbx204 = {.alive = 0},
+     .tbx205 = with_hdcp},
+    {.name = "backup-boot",
+     .description = "TBX-205 booted from its backup image",
+     .krd31 = sy_at_59_94i,
+     .tbx205 = {.config = 1, .alive = 0x41}},
+    {.name = "serial-fails",
+     .description = "the serial number cannot be read",
+     .serial = false,
+     .krd31 = sy_at_59_94i,
+     .tbx205 = with_hdcp},
 };
 const Kind *const kinds_end = std::end(kinds);
 
@@ -62,15 +54,14 @@ const Kind *find_kind(const char *name) {
 
 std::string driver_status(const Kind &kind) {
     std::string text = "VlAvio\n";
-    for (int i = 0; i < 4; i++) {
-        if (kind.boards[i].alive < 0)
-            continue;
-        char board[128];
-        snprintf(board, sizeof board,
+    unsigned device = 0x4160;
+    for (const Board &board : {kind.krd31, kind.tbx204, kind.tbx205, kind.tbx206}) {
+        char lines[128];
+        snprintf(lines, sizeof lines,
                  "\nVendorID=3c2b DeviceID=%x\nConfig : %08x\nAlive  : %08x\nErrors : 00000000\n",
-                 0x4160U + static_cast<unsigned>(i), static_cast<unsigned>(kind.boards[i].config),
-                 static_cast<unsigned>(kind.boards[i].alive));
-        text += board;
+                 device++, static_cast<unsigned>(board.config), static_cast<unsigned>(board.alive));
+        if (board.alive != Board::missing)
+            text += lines;
     }
     return text;
 }

@@ -5,16 +5,23 @@
 
 namespace unit {
 
+struct Board {
+    static constexpr int missing = -1;
+
+    int config = 0;
+    int alive = 0x01; // 0: not alive
+};
+
 struct Kind {
     const char *name;
     const char *description;
-    bool surrogate; // the surrogate parent runs
-    bool serial;    // the serial number can be read
-    bool driver;    // the video I/O driver is loaded
-    struct {
-        int config;
-        int alive; // 0: not alive; negative: the board is missing
-    } boards[4];
+    bool surrogate = true; // the surrogate parent runs
+    bool serial = true;    // the serial number can be read
+    bool driver = true;    // the video I/O driver is loaded
+    Board krd31 = {};
+    Board tbx204 = {};
+    Board tbx205 = {};
+    Board tbx206 = {};
 };
 
 extern const Kind kinds[];
