@@ -15,6 +15,7 @@
 #include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -32,6 +33,14 @@ static const std::string host = "/run/host"; // the machine's files as they are,
 static void check(bool good, const std::string &what) {
     if (!good)
         fail(what, strerror(errno));
+}
+
+// For what a machine may refuse altogether.
+static void check_allowed(bool good, const std::string &what) {
+    check(good,
+          "no namespaces here (start it as root, in `docker run --privileged`, or on a machine "
+          "of its own): " +
+              what);
 }
 
 static void check(const std::error_code &error, const std::string &what) {
@@ -54,11 +63,38 @@ void run(const std::string &command) {
 
 // ---- Namespaces
 
+static constexpr int namespaces = CLONE_NEWNS | CLONE_NEWNET | CLONE_NEWUTS | CLONE_NEWPID;
+
+static void mount_on(const std::string &path, const char *type, unsigned long flags = 0) {
+    const char *const options = strcmp(type, "tmpfs") == 0 ? "mode=755" : nullptr;
+    check(mount("unit", path.c_str(), type, flags, options) == 0, "mount " + path);
+}
+
+// A container that hides parts of /proc or /sys may grant a user namespace and refuse these mounts.
+static int mount_kernel_files(void * /*unused*/) {
+    return mount("unit", "/proc", "proc", 0, nullptr) == 0 &&
+                   mount("unit", "/sys", "sysfs", MS_RDONLY, nullptr) == 0
+               ? 0
+               : 1;
+}
+
+static bool user_namespaces_work() {
+    alignas(16) static char stack[65536];
+    const pid_t probe = clone(mount_kernel_files, stack + sizeof stack,
+                              CLONE_NEWUSER | namespaces | SIGCHLD, nullptr);
+    int status = 0;
+    return probe > 0 && waitpid(probe, &status, 0) == probe && status == 0;
+}
+
+// Root in a chroot or in a container may have no user namespace, and needs none.
 static void become_root() {
     const std::string uid = std::to_string(geteuid());
     const std::string gid = std::to_string(getegid());
-    check(unshare(CLONE_NEWUSER | CLONE_NEWNS | CLONE_NEWNET | CLONE_NEWUTS | CLONE_NEWPID) == 0,
-          "unshare (are user namespaces allowed here? they are not in a chroot)");
+    if (!user_namespaces_work()) {
+        check_allowed(unshare(namespaces) == 0, "unshare");
+        return;
+    }
+    check(unshare(CLONE_NEWUSER | namespaces) == 0, "unshare");
     write("/proc/self/setgroups", "deny");
     write("/proc/self/uid_map", "0 " + uid + " 1");
     write("/proc/self/gid_map", "0 " + gid + " 1");
@@ -83,9 +119,26 @@ static void fork_and_wait() {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
 }
 
-static void mount_on(const std::string &path, const char *type) {
-    const char *const options = strcmp(type, "tmpfs") == 0 ? "mode=755" : nullptr;
-    check(mount("unit", path.c_str(), type, 0, options) == 0, "mount " + path);
+// In a chroot "/" is no mount point: its mount, which may be shared with the machine, is made
+// private from the true root, and "/" is bound onto itself.
+static void make_chroot_private() {
+    const std::string directory = fs::current_path();
+    const int root = open("/", O_PATH | O_DIRECTORY | O_CLOEXEC);
+    check(setns(static_cast<int>(syscall(SYS_pidfd_open, getpid(), 0)), CLONE_NEWNS) == 0, "setns");
+    check(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0, "mount");
+    const int bound = open_tree(root, "", AT_EMPTY_PATH | AT_RECURSIVE | OPEN_TREE_CLONE);
+    check(move_mount(bound, "", root, "", MOVE_MOUNT_F_EMPTY_PATH | MOVE_MOUNT_T_EMPTY_PATH) == 0,
+          "move_mount");
+    check(fchdir(bound) == 0 && chroot(".") == 0 && chdir(directory.c_str()) == 0, "chroot");
+    close(bound);
+    close(root);
+}
+
+static void make_private() {
+    if (mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0)
+        return;
+    check_allowed(errno == EINVAL, "mount /");
+    make_chroot_private();
 }
 
 static void make_read_only() {
@@ -106,7 +159,7 @@ static void mirror(const std::string &directory) {
 }
 
 static void mount_all() {
-    check(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0, "mount /");
+    make_private();
     make_read_only();
     mount_on("/proc", "proc");
     mount_on("/proc/driver", "tmpfs");

@@ -7,14 +7,15 @@
 
 namespace unit {
 
-// Moves the caller into user, mount, network, UTS and PID namespaces of its own, as root there, and
-// returns in a new process; the first one waits for it and ends with its exit status. Call it
-// before the first thread is started. Inside:
+// Moves the caller into mount, network, UTS and PID namespaces of its own, and into a user
+// namespace where there are any, as root there, and returns in a new process; the first one waits
+// for it and ends with its exit status. Call it before the first thread is started. Inside:
 // - the machine's files are read-only, and everything the unit writes is on private file systems:
 //   /etc, /usr/bin, /usr/sbin and /dev begin as mirrors of the machine's, /run, /proc/driver and
 //   /var/cache begin empty;
-// - lo is up, and a second network namespace, "outside", holds the other ends of the interfaces
-//   (`ip -n outside ...`).
+// - lo is up, /sys shows the unit's interfaces, and a second network namespace, "outside", holds
+// the
+//   other ends of the interfaces (`ip -n outside ...`) and forwards, as a router does.
 void enter_namespaces();
 
 // Puts the unit's files in place afresh: network files, clock file, link to the zone file, version

@@ -1,5 +1,6 @@
 // vlsys-unit KIND COMMAND [ARGUMENT...]: runs a command inside a stand-in unit.
 // vlsys-unit --list: the kinds of unit.
+// vlsys-unit --check: exit status 0 when a stand-in unit can be made here.
 #include "standin/kinds.h"
 #include "standin/sandbox.h"
 
@@ -24,8 +25,12 @@ static void make_unit(const unit::Kind &kind) {
 int main(int argc, char **argv) {
     if (argc == 2 && strcmp(argv[1], "--list") == 0)
         return list_kinds();
+    if (argc == 2 && strcmp(argv[1], "--check") == 0) {
+        unit::enter_namespaces();
+        return 0;
+    }
     if (argc < 3) {
-        fputs("usage: vlsys-unit KIND COMMAND [ARGUMENT...] | vlsys-unit --list\n", stderr);
+        fputs("usage: vlsys-unit KIND COMMAND [ARGUMENT...] | --list | --check\n", stderr);
         return 2;
     }
     const unit::Kind *const kind = unit::find_kind(argv[1]);
