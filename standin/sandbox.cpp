@@ -176,9 +176,12 @@ static void make_networks() {
     write("/run/netns/outside", "");
     check(mount("/proc/self/ns/net", "/run/netns/outside", nullptr, MS_BIND, nullptr) == 0,
           "/run/netns/outside");
-    run("ip link set lo up");
+    // A neighbour that does not forward is no router: it would be a gateway until the first
+    // traffic.
+    run("ip link set lo up && sysctl -q -e -w net.ipv6.conf.all.forwarding=1");
     check(unshare(CLONE_NEWNET) == 0, "unshare(CLONE_NEWNET)");
     run("ip link set lo up");
+    mount_on("/sys", "sysfs", MS_RDONLY);
 }
 
 void enter_namespaces() {
@@ -215,8 +218,8 @@ void make_unit_files(const char *kind_name) {
     if (!kind)
         fail(kind_name, "no such kind of unit");
     std::error_code error;
-    for (const char *path :
-         {"/etc/sysconfig", "/etc/sysctl.d", "/etc/localtime", "/etc/resolv.conf"})
+    for (const char *path : {"/etc/sysconfig", "/etc/sysctl.d", "/etc/localtime",
+                             "/etc/resolv.conf", "/run/advertisement-delay"})
         fs::remove_all(path, error);
     copy_files();
     check(symlink("/usr/share/zoneinfo/UTC", "/etc/localtime") == 0, "/etc/localtime");
