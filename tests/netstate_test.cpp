@@ -203,7 +203,7 @@ TEST_F(Netstate, SettingInForceIsTheSettingWritten) {
                                 "fd00:1::ff:fe00:1/64, fe80::ff:fe00:1%eth0/64"};
     set_fixed_interfaces({"eth0", "eth1", "eth2"});
     EXPECT_EQ(restart_with({2, 1}, {3, 1}, 1), 0);
-    EXPECT_EQ(take_report(), end + "status: 0\n6 hostname: studio-1\n6 mode: DMAM0MM4_\n"
+    EXPECT_EQ(take_report(), end + "status: 0\n6 hostname: studio-1\n6 mode: DMAM0MM44\n"
                              "6 eth0: link up, MAC: 02-00-00-00-00-01\n"
                              "6 192.168.1.100/24, fd00:1::ff:fe00:1/64, fe80::ff:fe00:1%eth0/64\n"
                              "6 eth1: link up, MAC: 02-00-00-00-00-02\n"
@@ -224,6 +224,8 @@ TEST_F(Netstate, SettingInForceIsTheSettingWritten) {
         EXPECT_EQ(result, 0);
         std::string modes = log.substr(log.find(" mode: "), 16); // as the validator names them
         modes[12] = mode6 ? 'M' : '_'; // the kernel counts one reference to a route not in use
+        if (mode == VLSYS_MODE_MANUAL && (mode4 == VLSYS_MODE_DHCP || mode6 == VLSYS_MODE_DHCP))
+            modes[15] = mode6 == VLSYS_MODE_DHCP ? '6' : '4'; // the last lease's server stays
         const std::string link = mode4 + mode6 == 0 ? "no carrier, MAC: 02-00-00-00-00-01" :
             "link up, MAC: 02-00-00-00-00-01\n6 " + ipv4[mode4] +
             (mode4 && mode6 ? ", " : "") + ipv6[mode6];
@@ -231,6 +233,52 @@ TEST_F(Netstate, SettingInForceIsTheSettingWritten) {
         EXPECT_NE(log.find(lines.get()), std::string::npos) << log;
     }
     EXPECT_EQ(restarts, 12 + 11 + 6);
+}
+
+TEST_F(Netstate, ReportShowsWhatTheNetworkScriptsMadeOfTheFiles) {
+    const struct {
+        const char *why, *commands;
+        int result;
+        const char *line;
+    } rows[] = {
+        {"an interface that fails leaves the others alone",
+         "ip -n outside link set eth0 down; "
+         "echo 'DEVICE=eth1\nIPADDR=192.168.2.9\nNETMASK=255.255.255.0' >ifcfg-eth1",
+         1, "\n6 192.168.2.9/24, "},
+        {"a file without DEVICE does not come up", "echo ONBOOT=yes >ifcfg-eth1", 1,
+         "\n6 eth1: link up, MAC: 02-00-00-00-00-02\n6 fe80::ff:fe00:2%eth1/64\n"},
+        {"a killed writer's interface file counts", "touch ifcfg-eth0-AbCd12", 1,
+         "\n6 192.168.1.100/24, "},
+        {"a killed writer's switches win",
+         "echo net.ipv6.conf.eth0.disable_ipv6=1 >/etc/sysctl.d/velmora-AbCd12", 0,
+         "\n6 192.168.1.100/24\n"},
+        {"a gateway outside the lease's subnet gives none", "echo GATEWAY=192.168.2.1 >>../network",
+         0, "\n6 gw4  () [static], "},
+        {"a global gateway of a prefix that is yet to come is lost",
+         "echo IPV6_DEFAULTGW=fd00:1::1 >>../network; "
+         "echo net.ipv6.conf.eth0.accept_ra_defrtr=0 >>/etc/sysctl.d/velmora",
+         0, ", gw6 [off]\n"},
+        {"a link-local gateway is not",
+         "echo IPV6_DEFAULTGW=fe80::1%eth0 >>../network; "
+         "echo net.ipv6.conf.eth0.accept_ra_defrtr=0 >>/etc/sysctl.d/velmora",
+         0, ", gw6 fe80::1%eth0 (eth0) [static]\n"},
+        {"an empty DOMAIN keeps the lease's", "echo 'DNS1=10.0.0.1\nDOMAIN=' >>ifcfg-eth0", 0,
+         "\n6 DNS domain: lan1.example  server: 10.0.0.1, 192.168.1.1\n"},
+        {"an advertisement may come after the report", "echo 1 >/run/advertisement-delay", 0,
+         "\n6 192.168.1.100/24, fe80::ff:fe00:1%eth0/64\n"},
+    };
+    for (const auto &row : rows) {
+        SCOPED_TRACE(row.why);
+        unit::make_unit_files("sy");
+        set_fixed_interfaces({"eth0", "eth1"});
+        ASSERT_EQ(chdir("/etc/sysconfig/network-scripts"), 0);
+        run(row.commands);
+        take_log();
+        EXPECT_EQ(vlsys_network_restart(), row.result);
+        const std::string report = take_report();
+        EXPECT_NE(report.find(row.line), std::string::npos) << report;
+    }
+    run("until ip -6 addr show eth0 | grep -q fd00:1::ff:fe00:1/64; do sleep 0.1; done");
 }
 
 TEST_F(Netstate, RestartGivesTheResultOfTheCommand) {
