@@ -506,11 +506,12 @@ VLSYS_API int vlsys_network_restart(void);
  * caller reaps the child; one that could not execute the shell exits with 127. The child has the
  * caller's dispositions of SIGINT and SIGQUIT and its signal mask. In the parent the two signals
  * are ignored and SIGCHLD is blocked while the child is made, and put back before the return.
- * Standard output is flushed first.
+ * Standard output is flushed first. A process with other threads can call it too: between fork and
+ * exec the child neither logs nor takes memory or a lock.
  *
- * Returns -1, with errno set and nothing changed, when a signal could not be set or the child not
- * made. Logs the command (in the child) and the process id at LOG_DEBUG. Not for two threads at
- * once.
+ * Returns -1 with errno set when a signal could not be set or the child not made (logged), EFAULT
+ * for a null command (not logged). Logs the command, before the child is made, and the process id
+ * at LOG_DEBUG. Not for two threads at once.
  */
 VLSYS_API pid_t vlsys_spawn_direct(const char *command);
 
