@@ -532,10 +532,14 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  * The surrogate parent is a local service that runs shell commands for others: it takes the
  * caller's working directory and the command, and answers with a number. The three operations below
  * open one connection each, to TCP port 12865 of 127.0.0.1, and share these rules:
- * - A command is one line: what follows a line feed in it would not reach the shell.
  * - When the connection cannot be made (the reason is logged at LOG_ERR, the fallback at
  *   LOG_WARNING) the command is run directly, as each operation says. After it was made there is no
- *   fallback: the operation fails, and errno says why.
+ *   fallback: the operation fails, and errno says why. errno stays as it was when vlsys_system and
+ *   vlsys_spawn succeed.
+ * - A null command fails with EFAULT; nothing is run or logged.
+ * - To the surrogate parent a working directory and a command are one line each. When one has a
+ *   line feed the operation fails with EINVAL, and nothing is sent. A command that is run directly
+ *   may have line feeds.
  * - A request that could only be sent in part is not run.
  * - When connected, they log the working directory at LOG_DEBUG and the command at LOG_INFO
  *   (vlsys_popen: the whole request at LOG_DEBUG), and what each says below. A reply that is
@@ -546,10 +550,15 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  *   limit.
  * - The answer is what arrives first, at most 8191 bytes; it is not asked again, and believed.
  * - No signal is raised when the surrogate parent goes away, and the connection is closed in
- *   programs that the process executes.
+ *   programs that the process executes. A signal that arrives meanwhile cuts nothing short.
+ * - They may run on any thread, but vlsys_spawn on one at a time. The working directory is that of
+ *   the process.
  */
 #define VLSYS_SURROGATE_PORT "12865"
 
+ * - A command that is run directly is a child of the caller. When SIGCHLD is ignored, or a handler
+ *   of the caller's reaps every child, its end cannot be told: vlsys_system and vlsys_pclose then
+ *   return -1 (ECHILD), and vlsys_get_serial_number -300, although the command ran.
 /*
  * Connects to a TCP service of 127.0.0.1, given as a decimal port number. Blocks up to about 2
  * minutes, by the kernel's settings, while the service takes no connection.
@@ -566,8 +575,8 @@ VLSYS_API int vlsys_surrogate_connect(int quiet, const char *service);
  * Returns the command's wait status (exit code in bits 8 to 15, see vlsys_exit_status_text),
  * clamped to the range of int, or -1 with errno set: ECONNRESET when the surrogate parent closed
  * the connection without an answer, EPROTO when its answer is not a number followed by a line feed
- * or the end (and when the status itself is negative), else that of the call that failed (logged).
- * Logs the exit code at LOG_DEBUG.
+ * or the end (and when the status itself is negative), EFAULT and EINVAL as above, else that of the
+ * call that failed (logged). Logs the exit code at LOG_DEBUG.
  */
 VLSYS_API int vlsys_system(const char *command);
 
@@ -595,8 +604,7 @@ VLSYS_API FILE *vlsys_popen(const char *command);
 
 /*
  * Closes a stream of vlsys_popen. A command that the surrogate parent is still running is ended;
- * this takes 1 second in any case. One that was run directly is waited for without
- * a limit.
+ * this takes 1 second in any case. One that was run directly is waited for without a limit.
  *
  * Returns 0, also when the command could not be told to end (logged); the wait status that pclose
  * gives when the command was run directly; -1 for a null stream.

@@ -3,6 +3,7 @@
 #include "core/log.h"
 #include "core/owners.h"
 #include "core/text.h"
+#include "core/wait.h"
 
 #include <algorithm>
 #include <climits>
@@ -13,28 +14,50 @@
 
 namespace vlsys {
 
-// What the ways to run a command differ in.
-struct Way {
-    const char *marker;  // sent after the command
-    size_t buffer_size;  // holds the working directory, and the reply
-    size_t request_size; // the request must fit, its NUL included
-    bool logs_request;   // whole, instead of the command
-    // In messages:
-    const char *formatting_call;
-    const char *line_feed;
-    const char *recv_arguments;
-};
+namespace {
 
-static constexpr size_t pipe_size = 1024;
-static constexpr Way waited = {"", 8192, SIZE_MAX, false, "asprintf", "\\n", ""};
-static constexpr Way background = {" &", 8192, SIZE_MAX, false, "asprintf", "\n", ""};
-static constexpr Way pipe_read = {" |",       pipe_size, pipe_size,    true,
-                                  "snprintf", "\\n",     ", buf, 1024"};
+// The kinds of request: a command that is waited for, one in the background, one whose output is
+// read.
+enum class Kind { waited, background, pipe_read };
+
+struct Protocol {
+    const char *marker;  // sent after the command
+    size_t buffer_size;  // of the working directory, and of the reply: their size with a NUL
+    size_t request_size; // the same of the request
+};
 
 struct Reply {
-    char text[8192]; // NUL-terminated; before the reply comes, the working directory
-    size_t length;
+    char text[8192]; // NUL-terminated
+    size_t length = 0;
 };
+
+} // namespace
+
+// By Kind.
+static constexpr Protocol protocols[] = {
+    {.marker = "", .buffer_size = sizeof Reply::text, .request_size = SIZE_MAX},
+    {.marker = " &", .buffer_size = sizeof Reply::text, .request_size = SIZE_MAX},
+    {.marker = " |", .buffer_size = 1024, .request_size = 1024},
+};
+
+static const Protocol &protocol_of(Kind kind) {
+    return protocols[static_cast<size_t>(kind)];
+}
+
+// The service's address on the loopback interface; null, after the message, when it has none.
+static AddressList find_address(const char *service) {
+    struct addrinfo hints = {};
+    hints.ai_family = AF_INET;
+    hints.ai_socktype = SOCK_STREAM;
+    hints.ai_flags = AI_NUMERICHOST | AI_NUMERICSERV;
+    struct addrinfo *list = nullptr;
+    const int error = getaddrinfo(nullptr, service, &hints, &list); // no host: loopback
+    if (error == EAI_SYSTEM)
+        log_errno("%s", "getaddrinfo");
+    else if (error != 0)
+        vlsys_log(LOG_ERR, "getaddrinfo: %s", gai_strerror(error));
+    return AddressList(error == 0 ? list : nullptr);
+}
 
 static Fd connect_or_warn() {
     const int socket = vlsys_surrogate_connect(0, VLSYS_SURROGATE_PORT);
@@ -43,17 +66,31 @@ static Fd connect_or_warn() {
     return Fd(socket);
 }
 
-// Null, after the message, when it can't be made or is too long.
-static Text make_request(const Way &way, const char *directory, const char *command) {
-    Text request = format_text("%s\n%s%s\n", directory, command, way.marker);
-    if (request && strlen(request.get()) >= way.request_size) {
+// Null, and errno set, when it cannot be made. A line feed more than the two that it must have
+// would give the surrogate parent another command.
+static Text make_request(Kind kind, const char *directory, const char *command) {
+    const Protocol &protocol = protocol_of(kind);
+    if (strchr(directory, '\n') || strchr(command, '\n')) {
+        errno = EINVAL;
+        return nullptr;
+    }
+    Text request = format_text("%s\n%s%s\n", directory, command, protocol.marker);
+    if (request && strlen(request.get()) >= protocol.request_size) {
         request.reset();
         errno = E2BIG;
     }
-    if (!request)
-        vlsys_log(LOG_ERR, "%s(\"%s%s%s%s\\n\"): %m", way.formatting_call, directory, way.line_feed,
-                  command, way.marker);
     return request;
+}
+
+static int log_request_failure(Kind kind, const char *directory, const char *command) {
+    switch (kind) {
+    case Kind::waited:
+        return log_errno("asprintf(\"%s\\n%s\\n\")", directory, command);
+    case Kind::background:
+        return log_errno("asprintf(\"%s\n%s &\\n\")", directory, command);
+    default:
+        return log_errno("snprintf(\"%s\\n%s |\\n\")", directory, command);
+    }
 }
 
 static bool send_all(int socket, std::string_view text) {
@@ -68,40 +105,39 @@ static bool send_all(int socket, std::string_view text) {
 }
 
 // `name` is what the message calls the text.
-static bool send_or_log(int socket, std::string_view text, const char *name) {
+static int send_text(int socket, std::string_view text, const char *name) {
     if (send_all(socket, text))
-        return true;
-    vlsys_log(LOG_ERR, "send(%d, \"%s\\n\", %d): %m", socket, name, static_cast<int>(text.size()));
-    return false;
+        return 0;
+    return log_errno("send(%d, \"%s\\n\", %d)", socket, name, static_cast<int>(text.size()));
 }
 
-static bool receive(int socket, const Way &way, Reply *reply) {
-    const ssize_t length = TEMP_FAILURE_RETRY(recv(socket, reply->text, way.buffer_size - 1, 0));
-    if (length < 0) {
-        vlsys_log(LOG_ERR, "recv(%d%s): %m", socket, way.recv_arguments);
-        return false;
-    }
+static int receive(int socket, Kind kind, Reply *reply) {
+    const size_t size = protocol_of(kind).buffer_size;
+    const ssize_t length = TEMP_FAILURE_RETRY(recv(socket, reply->text, size - 1, 0));
+    if (length < 0 && kind == Kind::pipe_read)
+        return log_errno("recv(%d, buf, %d)", socket, static_cast<int>(size));
+    if (length < 0)
+        return log_errno("recv(%d)", socket);
     reply->length = static_cast<size_t>(length);
     reply->text[length] = '\0';
-    return true;
+    return 0;
 }
 
-// The conversation up to the reply.
-static bool ask(int socket, const Way &way, const char *command, Reply *reply) {
-    char *const directory = reply->text;
-    if (!getcwd(directory, way.buffer_size)) {
-        vlsys_log(LOG_ERR, "%s: %m", "getcwd");
-        return false;
-    }
+// The conversation up to the reply. Returns 0, or the negated errno, logged.
+static int ask(int socket, Kind kind, const char *command, Reply *reply) {
+    char directory[sizeof reply->text];
+    if (!getcwd(directory, protocol_of(kind).buffer_size))
+        return log_errno("%s", "getcwd");
     vlsys_log(LOG_DEBUG, "CWD: %s", directory);
-    if (!way.logs_request)
+    if (kind != Kind::pipe_read)
         vlsys_log(LOG_INFO, "CMD: %s", command);
-    const Text request = make_request(way, directory, command);
+    const Text request = make_request(kind, directory, command);
     if (!request)
-        return false;
-    if (way.logs_request)
+        return log_request_failure(kind, directory, command);
+    if (kind == Kind::pipe_read)
         vlsys_log(LOG_DEBUG, "%s", request.get());
-    return send_or_log(socket, request.get(), command) && receive(socket, way, reply);
+    const int result = send_text(socket, request.get(), command);
+    return result < 0 ? result : receive(socket, kind, reply);
 }
 
 // The number that the text begins with, clamped; `end` is where it ends.
@@ -109,13 +145,50 @@ static int parse_number(const char *text, char **end) {
     return static_cast<int>(std::clamp<long>(strtol(text, end, 10), INT_MIN, INT_MAX));
 }
 
-// A reply that is one number. errno is set in any case, for the number may be negative and no
-// failed call then says why.
-static bool take_number(const Reply &reply, int *number) {
+// The number of a reply that is nothing else. Returns 0 or a negated errno, not logged.
+static int take_number(const Reply &reply, int *number) {
+    if (reply.length == 0)
+        return -ECONNRESET;
     char *end = nullptr;
     *number = parse_number(reply.text, &end);
-    errno = reply.length == 0 ? ECONNRESET : EPROTO;
-    return end != reply.text && (end == reply.text + reply.length || *end == '\n');
+    const bool ends_there = end == reply.text + reply.length || *end == '\n';
+    return end != reply.text && ends_there ? 0 : -EPROTO;
+}
+
+static int run_waited(const char *command, int *status) {
+    if (!command)
+        return -EFAULT;
+    const Fd connection = connect_or_warn();
+    if (!connection) {
+        *status = system(command);
+        return *status < 0 ? -errno : 0;
+    }
+    Reply reply;
+    int result = ask(connection.get(), Kind::waited, command, &reply);
+    if (result == 0)
+        result = take_number(reply, status);
+    if (result == 0)
+        vlsys_log(LOG_DEBUG, "\"%s\" returned %d", command, (*status >> 8) & 0xff);
+    return result;
+}
+
+static int start_in_background(const char *command, int *pid) {
+    if (!command)
+        return -EFAULT;
+    const Fd connection = connect_or_warn();
+    if (!connection) {
+        *pid = vlsys_spawn_direct(command);
+        return *pid < 0 ? -errno : 0;
+    }
+    Reply reply;
+    int result = ask(connection.get(), Kind::background, command, &reply);
+    if (result < 0)
+        return result;
+    vlsys_log(LOG_DEBUG, "received %s", reply.text);
+    result = take_number(reply, pid);
+    if (result == 0)
+        vlsys_log(LOG_DEBUG, "\"%s\" pid: %d", command, *pid);
+    return result;
 }
 
 // The number of the first line that is not empty.
@@ -126,83 +199,75 @@ static void log_process_id(Reply *reply) {
         vlsys_log(LOG_INFO, "pid: %d", parse_number(line, nullptr));
 }
 
+// The result of a public operation. errno says why it is negative, also when the number itself is,
+// and stays the caller's otherwise.
+static int number_or_failure(int result, int number, int caller_errno) {
+    if (result < 0) {
+        errno = -result;
+        return -1;
+    }
+    errno = number < 0 ? EPROTO : caller_errno;
+    return number;
+}
+
 } // namespace vlsys
 
 using namespace vlsys;
 
 int vlsys_surrogate_connect(int quiet, const char *service) {
-    struct addrinfo hints = {};
-    hints.ai_family = AF_INET;
-    hints.ai_socktype = SOCK_STREAM;
-    hints.ai_flags = AI_NUMERICHOST | AI_NUMERICSERV;
-    struct addrinfo *list = nullptr;
-    const int error = getaddrinfo(nullptr, service, &hints, &list); // no host: loopback
-    if (error == EAI_SYSTEM)
-        vlsys_log(LOG_ERR, "%s: %m", "getaddrinfo");
-    else if (error != 0)
-        vlsys_log(LOG_ERR, "getaddrinfo: %s", gai_strerror(error));
-    if (error != 0)
+    const AddressList address = find_address(service);
+    if (!address)
         return -1;
-    const AddressList address(list);
-
     Fd connection(
         socket(address->ai_family, address->ai_socktype | SOCK_CLOEXEC, address->ai_protocol));
     if (!connection) {
-        vlsys_log(LOG_ERR, "%s: %m", "socket");
+        log_errno("%s", "socket");
         return -1;
     }
     // Called again after a signal, connect waits on for the same connection.
     if (TEMP_FAILURE_RETRY(connect(connection.get(), address->ai_addr, address->ai_addrlen)) != 0) {
         if (quiet && errno == ECONNREFUSED)
             return 0;
-        vlsys_log(LOG_ERR, "%s: %m", "connect");
+        log_errno("%s", "connect");
         return -1;
     }
     return connection.release();
 }
 
 int vlsys_system(const char *command) {
-    const Fd connection = connect_or_warn();
-    if (!connection)
-        return system(command);
-    Reply reply;
+    const int caller_errno = errno;
     int status = 0;
-    if (!ask(connection.get(), waited, command, &reply) || !take_number(reply, &status))
-        return -1;
-    vlsys_log(LOG_DEBUG, "\"%s\" returned %d", command, (status >> 8) & 0xff);
-    return status;
+    const int result = run_waited(command, &status);
+    return number_or_failure(result, status, caller_errno);
 }
 
 int vlsys_spawn(const char *command) {
-    const Fd connection = connect_or_warn();
-    if (!connection)
-        return vlsys_spawn_direct(command);
-    Reply reply;
-    if (!ask(connection.get(), background, command, &reply))
-        return -1;
-    vlsys_log(LOG_DEBUG, "received %s", reply.text);
+    const int caller_errno = errno;
     int pid = 0;
-    if (!take_number(reply, &pid))
-        return -1;
-    vlsys_log(LOG_DEBUG, "\"%s\" pid: %d", command, pid);
-    return pid;
+    const int result = start_in_background(command, &pid);
+    return number_or_failure(result, pid, caller_errno);
 }
 
 FILE *vlsys_popen(const char *command) {
+    if (!command) {
+        errno = EFAULT;
+        return nullptr;
+    }
     Fd connection = connect_or_warn();
     if (!connection)
         return popen(command, "re");
     Reply reply;
-    if (!ask(connection.get(), pipe_read, command, &reply))
+    if (ask(connection.get(), Kind::pipe_read, command, &reply) < 0)
         return nullptr;
     log_process_id(&reply);
-    if (!send_or_log(connection.get(), "start\n", "start\n"))
+    if (send_text(connection.get(), "start\n", "start\n") < 0)
         return nullptr;
     FILE *const stream = fdopen(connection.get(), "r");
-    if (stream)
-        connection.release();
-    else
-        vlsys_log(LOG_ERR, "fdopen(%d): %m", connection.get());
+    if (!stream) {
+        log_errno("fdopen(%d)", connection.get());
+        return nullptr;
+    }
+    connection.release();
     return stream;
 }
 
@@ -213,9 +278,9 @@ int vlsys_pclose(FILE *stream) {
     if (!send_all(socket, "kill\n")) {
         if (errno == ENOTSOCK)
             return pclose(stream);
-        vlsys_log(LOG_ERR, "send(%d, \"kill\\n\"): %m", socket);
+        log_errno("send(%d, \"kill\\n\")", socket);
     }
-    sleep(1);
+    wait_seconds(1);
     fclose(stream);
     return 0;
 }
