@@ -176,18 +176,21 @@ VLSYS_API int vlsys_setlogmask(int mask);
  * -EIO     zone file of fewer than 4 bytes;
  * else the negated errno of the step that failed.
  * After a failure in the zone file or the link /etc/localtime is what it was; after one in the
- * clock file the link is the new one, the clock file is what it was, and TZ is not set. Two calls
- * at once on one system tree interfere.
+ * clock file (one that cannot be read, written, flushed to disk or closed) the link is the new one,
+ * the clock file is what it was, and TZ is not set. Two calls at once on one system tree interfere;
+ * no other thread may use the environment meanwhile. Waits for the clock file to reach the disk.
  */
 VLSYS_API int vlsys_set_timezone(const char *zone);
 
 /*
+ * -ENAMETOOLONG  zone whose file has a path of over 4095 bytes;
  * The zone name of <root>/etc/sysconfig/clock: what stands between the ZONE=" and the last double
  * quote of the first line that has a ZONE=" (to the end of the line, line feed included, when no
  * other quote follows). An unquoted zone is not found. Lines over 79 bytes count as several.
  *
  * Copies it into the buffer of `size` bytes as vlsys_strlcpy does. Returns its whole length; 0, and
- * the buffer unchanged, when the buffer is null, the file cannot be opened or has no zone.
+ * the buffer unchanged, when the buffer is null, the file has no zone, or cannot be opened or read
+ * (logged). May run on any thread.
  */
 VLSYS_API size_t vlsys_get_timezone(char *buffer, size_t size);
 

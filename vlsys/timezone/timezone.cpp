@@ -1,3 +1,4 @@
+#include "core/lines.h"
 #include "core/log.h"
 #include "core/owners.h"
 #include "core/paths.h"
@@ -13,17 +14,15 @@ namespace vlsys {
 
 static int check_zone_file(const char *path) {
     const Fd file(open(path, O_RDONLY | O_CLOEXEC));
-    if (!file) {
-        vlsys_log(LOG_ERR, "open(%s): %m", path);
-        return -errno;
-    }
+    if (!file)
+        return log_errno("open(%s)", path);
     static constexpr std::string_view magic = "TZif";
     char start[magic.size()];
-    errno = EIO; // the reason when the file is shorter
-    if (read(file.get(), start, sizeof start) != static_cast<ssize_t>(sizeof start)) {
-        vlsys_log(LOG_ERR, "read(%s): %m", path);
-        return -errno;
-    }
+    const ssize_t length = TEMP_FAILURE_RETRY(read(file.get(), start, sizeof start));
+    if (length >= 0 && length < static_cast<ssize_t>(sizeof start))
+        errno = EIO; // the system has none for a file that is shorter
+    if (length != static_cast<ssize_t>(sizeof start))
+        return log_errno("read(%s)", path);
     if (std::string_view(start, sizeof start) != magic) {
         vlsys_log(LOG_ERR, "%s: is not tzfile", path);
         return -ENOENT;
@@ -34,35 +33,32 @@ static int check_zone_file(const char *path) {
 // Makes a link beside the path and moves it there, so that the path always names something.
 static int replace_link(const char *path, const char *target) {
     const Text link = format_text("%s.new", path);
-    if (!link) {
-        vlsys_log(LOG_ERR, "asprintf(\"%%s.new\", %s): %m", path);
-        return -errno;
-    }
-    if (unlink(link.get()) != 0 && errno != ENOENT) {
-        vlsys_log(LOG_ERR, "unlink(%s): %m", link.get());
-        return -errno;
-    }
-    if (symlink(target, link.get()) != 0) {
-        vlsys_log(LOG_ERR, "symlink(%s, %s): %m", target, link.get());
-        return -errno;
-    }
-    if (rename(link.get(), path) != 0) {
-        vlsys_log(LOG_ERR, "rename(%s, %s): %m", link.get(), path);
-        return -errno;
-    }
+    if (!link)
+        return log_errno("asprintf(\"%%s.new\", %s)", path);
+    if (unlink(link.get()) != 0 && errno != ENOENT)
+        return log_errno("unlink(%s)", link.get());
+    if (symlink(target, link.get()) != 0)
+        return log_errno("symlink(%s, %s)", target, link.get());
+    if (rename(link.get(), path) != 0)
+        return log_errno("rename(%s, %s)", link.get(), path);
     return 0;
 }
 
 static int set_localtime(const char *zone) {
     char zone_file[VLSYS_PATH_SIZE];
     vlsys_strlcpy(zone_file, zoneinfo_prefix, sizeof zone_file);
-    vlsys_strlcat(zone_file, zone, sizeof zone_file);
+    if (vlsys_strlcat(zone_file, zone, sizeof zone_file) >= sizeof zone_file) {
+        errno = ENAMETOOLONG; // the beginning may be the path of another zone
+        return log_errno("open(%s)", zone_file);
+    }
     const int result = check_zone_file(zone_file);
     if (result != 0)
         return result;
     const SystemPath localtime(localtime_path);
     return replace_link(localtime.text, zone_file);
 }
+
+namespace {
 
 // The clock file is read in pieces: a line, or the next 79 bytes of a longer one.
 struct Piece {
@@ -72,26 +68,28 @@ struct Piece {
     std::string_view text() const { return {bytes, length}; }
 };
 
-// False at the end of the file. Bytes are taken as they are, NUL included.
-static bool read_piece(FILE *file, Piece *piece) {
+} // namespace
+
+// Bytes are taken as they are, NUL included. Returns 1; 0 at the end of the file; the negated errno
+// when it cannot be read (not logged).
+static int read_piece(FILE *file, Piece *piece) {
     piece->length = 0;
     int c = 0;
-    while (piece->length + 1 < sizeof piece->bytes && c != '\n' && (c = getc_unlocked(file)) != EOF)
+    while (piece->length + 1 < sizeof piece->bytes && c != '\n' && (c = next_byte(file)) != EOF)
         piece->bytes[piece->length++] = static_cast<char>(c);
-    return piece->length > 0;
+    if (c == EOF && ferror(file))
+        return -errno;
+    return piece->length > 0 ? 1 : 0;
 }
 
+// Null, after the message, when there is no memory.
 static Text make_zone_line(const char *zone) {
-    Text line;
-    if (zone[0] == '"') {
-        line = format_text("ZONE=%s\n", zone);
-        if (!line)
-            vlsys_log(LOG_ERR, "asprintf(\"ZONE=%%s\\n\", %s): %m", zone);
-    } else {
-        line = format_text("ZONE=\"%s\"\n", zone);
-        if (!line)
-            vlsys_log(LOG_ERR, "asprintf(\"ZONE=\"%%s\"\\n\", %s): %m", zone);
-    }
+    const bool is_quoted = zone[0] == '"';
+    Text line = is_quoted ? format_text("ZONE=%s\n", zone) : format_text("ZONE=\"%s\"\n", zone);
+    if (!line && is_quoted)
+        log_errno("asprintf(\"ZONE=%%s\\n\", %s)", zone);
+    else if (!line)
+        log_errno("asprintf(\"ZONE=\"%%s\"\\n\", %s)", zone);
     return line;
 }
 
@@ -103,25 +101,24 @@ static int rewrite_clock(FILE *clock, const char *path, std::string_view zone_li
                                     std::min(zone_line.size(), sizeof piece.bytes - 1));
     bool has_zone = false;
     bool in_line = false;
-    while (read_piece(clock, &piece)) {
+    int result = 0;
+    while ((result = read_piece(clock, &piece)) > 0) {
         std::string_view text = piece.text();
         if (text.find("ZONE=") != std::string_view::npos) {
             has_zone = true;
             text = cut_line;
         }
         in_line = text.back() != '\n';
-        const int result = replacement->write(text);
-        if (result != 0)
+        result = replacement->write(text);
+        if (result < 0)
             return result;
     }
-    if (ferror(clock)) {
-        vlsys_log(LOG_ERR, "fgets(%s): %m", path);
-        return -errno;
-    }
+    if (result < 0)
+        return log_errno("fgets(%s)", path);
     if (has_zone)
         return 0;
-    const int result = in_line ? replacement->write("\n") : 0;
-    return result != 0 ? result : replacement->write(zone_line);
+    result = in_line ? replacement->write("\n") : 0;
+    return result < 0 ? result : replacement->write(zone_line);
 }
 
 static int set_clock_zone(const char *zone) {
@@ -134,10 +131,8 @@ static int set_clock_zone(const char *zone) {
     if (result != 0)
         return result;
     const File clock(fopen(path.text, "re"));
-    if (!clock) {
-        vlsys_log(LOG_ERR, "fopen(\"%s\", \"r\"): %m", path.text);
-        return -errno;
-    }
+    if (!clock)
+        return log_errno("fopen(\"%s\", \"r\")", path.text);
     result = rewrite_clock(clock.get(), path.text, zone_line.get(), &replacement);
     if (result == 0)
         result = replacement.commit();
@@ -147,9 +142,12 @@ static int set_clock_zone(const char *zone) {
     return 0;
 }
 
-static size_t read_zone(FILE *clock, char *zone, size_t size) {
+// The length of the zone, which is copied; 0 without one, and when the file cannot be read.
+static size_t read_zone(FILE *clock, const char *path, char *zone, size_t size) {
     static constexpr std::string_view key = "ZONE=\"";
-    for (Piece piece; read_piece(clock, &piece);) {
+    Piece piece;
+    int result = 0;
+    while ((result = read_piece(clock, &piece)) > 0) {
         std::string_view value = piece.text();
         const size_t at = value.find(key);
         if (at == std::string_view::npos)
@@ -159,6 +157,8 @@ static size_t read_zone(FILE *clock, char *zone, size_t size) {
         start[std::min(value.rfind('"'), value.size())] = '\0';
         return vlsys_strlcpy(zone, start, size);
     }
+    if (result < 0)
+        log_errno("fgets(%s)", path);
     return 0;
 }
 
@@ -187,10 +187,10 @@ size_t vlsys_get_timezone(char *buffer, size_t size) {
     const SystemPath path(clock_path);
     const File clock(fopen(path.text, "re"));
     if (!clock) {
-        vlsys_log(LOG_ERR, "fopen(\"%s\", \"r\"): %m", path.text);
+        log_errno("fopen(\"%s\", \"r\")", path.text);
         return 0;
     }
-    return read_zone(clock.get(), buffer, size);
+    return read_zone(clock.get(), path.text, buffer, size);
 }
 
 size_t vlsys_get_utc_offset(char *buffer, size_t size) {
@@ -199,7 +199,7 @@ size_t vlsys_get_utc_offset(char *buffer, size_t size) {
     const time_t now = time(nullptr);
     struct tm local;
     if (!localtime_r(&now, &local)) {
-        vlsys_log(LOG_ERR, "%s: %m", "localtime_r");
+        log_errno("%s", "localtime_r");
         return 0;
     }
     return strftime(buffer, size, "%z", &local);
