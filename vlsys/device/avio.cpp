@@ -13,20 +13,25 @@ namespace vlsys {
 
 AvioStatus avio_status;
 
+namespace {
+
 struct Board {
     const char *name;
     std::string_view device; // as the status file's header line names it
     uint16_t id;
     int found; // bits of the scan's result
     int alive;
+    bool traces_alive;
 };
+
+} // namespace
 
 // By AvioBoard.
 static constexpr Board boards[] = {
-    {"KRD-31", "DeviceID=4160", VLSYS_AVIO_KRD31, 0x01, 0x10},
-    {"TBX-204", "DeviceID=4161", VLSYS_AVIO_TBX204, 0x02, 0x20},
-    {"TBX-205", "DeviceID=4162", VLSYS_AVIO_TBX205, 0x04, 0x40},
-    {"TBX-206", "DeviceID=4163", VLSYS_AVIO_TBX206, 0x08, 0x80},
+    {"KRD-31", "DeviceID=4160", VLSYS_AVIO_KRD31, 0x01, 0x10, true},
+    {"TBX-204", "DeviceID=4161", VLSYS_AVIO_TBX204, 0x02, 0x20, true},
+    {"TBX-205", "DeviceID=4162", VLSYS_AVIO_TBX205, 0x04, 0x40, false},
+    {"TBX-206", "DeviceID=4163", VLSYS_AVIO_TBX206, 0x08, 0x80, false},
 };
 static constexpr int board_count = static_cast<int>(std::size(boards));
 
@@ -39,12 +44,16 @@ static constexpr std::string_view alive_prefix = "Alive  :";
 static constexpr int no_board = -1;      // before the first header
 static constexpr int unknown_board = -2; // under another board's header: its registers are not ours
 
+namespace {
+
 // A line that matters, and the board it belongs to.
 struct StatusLine {
     int board = no_board; // index, no_board or unknown_board
     bool is_header = false;
     uint32_t value = 0; // of a register line
 };
+
+} // namespace
 
 static int find_board(const char *device) {
     for (int i = 0; i < board_count; i++)
@@ -60,34 +69,39 @@ static uint32_t parse_register(const char *text) {
     return value < 0 || value > UINT32_MAX ? UINT32_MAX : static_cast<uint32_t>(value);
 }
 
-// Reads on to the next header, or the next register line that begins with the prefix.
-static bool next_line(FILE *file, std::string_view register_prefix, StatusLine *result) {
+// Reads on to the next header, or the next register line that begins with the prefix. Returns 1;
+// 0 at the end of the file; the negated errno when it cannot be read, logged.
+static int next_line(FILE *file, std::string_view register_prefix, StatusLine *status) {
     char line[1024];
-    while (read_line(file, line, sizeof line) > 0) {
+    int result = 0;
+    while ((result = read_line(file, line, sizeof line)) > 0) {
         const std::string_view text = line;
-        result->is_header = starts_with(text, header_prefix);
-        if (result->is_header) {
-            result->board = find_board(line + header_prefix.size());
-            return true;
+        status->is_header = starts_with(text, header_prefix);
+        if (status->is_header) {
+            status->board = find_board(line + header_prefix.size());
+            return 1;
         }
         if (starts_with(text, register_prefix)) {
-            result->value = parse_register(line + register_prefix.size());
-            return true;
+            status->value = parse_register(line + register_prefix.size());
+            return 1;
         }
     }
-    return false;
+    return result < 0 ? log_errno("fgets(%s)", avio_status_path) : 0;
 }
 
 int read_config(FILE *file) {
     avio_status.config_read = 0;
     int result = 0;
+    int more = 0;
     StatusLine line;
-    while (next_line(file, config_prefix, &line)) {
+    while ((more = next_line(file, config_prefix, &line)) > 0) {
         if (line.board < 0)
             result = -1;
         else if (!line.is_header)
             avio_status.boards[line.board].config = line.value;
     }
+    if (more < 0)
+        return -1;
     if (result == 0)
         avio_status.config_read = 1;
     return result;
@@ -96,14 +110,15 @@ int read_config(FILE *file) {
 static void accept_alive(int board, uint32_t value) {
     avio_status.boards[board].alive = static_cast<uint8_t>(value);
     avio_status.boards[board].device_id = boards[board].id;
-    if (board == krd31 || board == tbx204)
+    if (boards[board].traces_alive)
         vlsys_log(LOG_DEBUG, "%s Alive: %#x", boards[board].name, value);
 }
 
 int scan_alive(FILE *file) {
     int mask = 0;
+    int more = 0;
     StatusLine line;
-    while (next_line(file, alive_prefix, &line)) {
+    while ((more = next_line(file, alive_prefix, &line)) > 0) {
         if (line.is_header) {
             mask |= line.board >= 0 ? boards[line.board].found : VLSYS_AVIO_UNKNOWN_DEVICE;
             continue;
@@ -118,37 +133,44 @@ int scan_alive(FILE *file) {
         accept_alive(line.board, line.value);
         mask |= boards[line.board].alive;
     }
-    return mask;
+    return more < 0 ? VLSYS_AVIO_NO_DRIVER : mask;
 }
 
 static File open_status() {
     File file(fopen(avio_status_path, "re"));
     if (!file)
-        vlsys_log(LOG_ERR, "fopen(%s): %m", avio_status_path);
+        log_errno("fopen(%s)", avio_status_path);
     return file;
 }
 
 // ---- Waiting for the boards
 
-// True when all boards came up, or there is no driver to wait for. Gives the number of polls that
-// found the boards not ready, and the last scan's result.
-static bool wait_alive(int *polls, int *mask) {
+namespace {
+
+struct Wait {
+    bool is_ready; // all boards came up, or there is no driver to wait for
+    int polls;     // that found the boards not ready
+    int mask;      // of the last scan
+};
+
+} // namespace
+
+static Wait wait_alive() {
     constexpr int poll_limit = 960;
     constexpr struct timespec interval = {0, 29970030};
-    for (*polls = 0;;) {
-        *mask = vlsys_avio_scan_alive();
-        if (*mask == VLSYS_AVIO_READY) {
+    for (int polls = 0;;) {
+        const int mask = vlsys_avio_scan_alive();
+        if (mask == VLSYS_AVIO_READY) {
             vlsys_log(LOG_INFO, "VlAvio alive");
-            return true;
+            return {.is_ready = true, .polls = polls, .mask = mask};
         }
-        if ((*mask & VLSYS_AVIO_NO_DRIVER) != 0) {
+        if ((mask & VLSYS_AVIO_NO_DRIVER) != 0) {
             vlsys_log(LOG_WARNING, "%s", "can't get VlAvio status. Emulator ?");
-            return true;
+            return {.is_ready = true, .polls = polls, .mask = mask};
         }
-        if (++*polls == poll_limit)
-            return false;
-        if (nanosleep(&interval, nullptr) != 0 && errno == EINTR)
-            return false;
+        polls++;
+        if (polls == poll_limit || (nanosleep(&interval, nullptr) != 0 && errno == EINTR))
+            return {.is_ready = false, .polls = polls, .mask = mask};
     }
 }
 
@@ -172,8 +194,9 @@ static bool report_config() {
 static void report_alive() {
     static constexpr const char *frequencies[] = {"unknown", "59.94i", "50i", "unknown"};
     static constexpr const char *destinations[] = {"unknown", "SY", "CN", "unknown"};
-    vlsys_log(LOG_INFO, "Frame Frequency: %s, Destination: %s", frequencies[frame_frequency()],
-              destinations[destination()]);
+    vlsys_log(LOG_INFO, "Frame Frequency: %s, Destination: %s",
+              frequencies[static_cast<int>(frame_frequency())],
+              destinations[static_cast<int>(destination())]);
     vlsys_log(LOG_INFO, "HDCP handling capability: %s", can_handle_hdcp() ? "yes" : "no");
 }
 
@@ -192,14 +215,14 @@ static void report_list(const char *what, const bool (&listed)[board_count]) {
     vlsys_log(LOG_INFO, "%s device(s): %s", what, list);
 }
 
-static void report_timeout(int polls, int mask) {
+static void report_timeout(const Wait &wait) {
     constexpr int polls_per_second = 30;
-    vlsys_log(LOG_ERR, "timeout (%d). ", polls / polls_per_second);
+    vlsys_log(LOG_ERR, "timeout (%d). ", wait.polls / polls_per_second);
     bool not_found[board_count];
     bool not_alive[board_count];
     for (int i = 0; i < board_count; i++) {
-        not_found[i] = (mask & boards[i].found) == 0;
-        not_alive[i] = !not_found[i] && (mask & boards[i].alive) == 0;
+        not_found[i] = (wait.mask & boards[i].found) == 0;
+        not_alive[i] = !not_found[i] && (wait.mask & boards[i].alive) == 0;
     }
     report_list("not found", not_found);
     report_list("not alive", not_alive);
@@ -230,12 +253,10 @@ int vlsys_avio_scan_alive(void) {
 
 int vlsys_avio_wait_ready(void) {
     vlsys_log(LOG_INFO, "waiting for VlAvio to be ready");
-    int polls = 0;
-    int mask = 0;
-    const bool ready = wait_alive(&polls, &mask);
+    const Wait wait = wait_alive();
     const bool from_backup = vlsys_avio_read_config() == 0 && report_config();
-    if (!ready) {
-        report_timeout(polls, mask);
+    if (!wait.is_ready) {
+        report_timeout(wait);
         return 0;
     }
     report_alive();

@@ -6,7 +6,7 @@
 
 namespace vlsys {
 
-enum AvioBoard { krd31, tbx204, tbx205, tbx206 };
+enum class AvioBoard { krd31, tbx204, tbx205, tbx206 };
 
 struct AvioRegisters {
     uint32_t config;    // 0: normal boot, 1: boot from the backup image, others illegal
@@ -22,23 +22,27 @@ struct AvioStatus {
 // Each read overwrites what it finds in the file; nothing empties the table again.
 extern AvioStatus avio_status;
 
-// Fields of the cached Alive registers; other values than the named ones are unknown.
-enum FrameFrequency { frequency_59_94i = 1, frequency_50i = 2 };
-enum Destination { destination_sy = 1, destination_cn = 2 };
-
-inline int frame_frequency() {
-    return (avio_status.boards[krd31].alive >> 1) & 3;
+inline const AvioRegisters &registers_of(AvioBoard board) {
+    return avio_status.boards[static_cast<int>(board)];
 }
 
-inline int destination() {
-    return (avio_status.boards[krd31].alive >> 4) & 3;
+// Fields of the cached Alive registers; 0 and 3 are unknown.
+enum class FrameFrequency { hz59_94 = 1, hz50 = 2 };
+enum class Destination { sy = 1, cn = 2 };
+
+inline FrameFrequency frame_frequency() {
+    return static_cast<FrameFrequency>((registers_of(AvioBoard::krd31).alive >> 1) & 3);
+}
+
+inline Destination destination() {
+    return static_cast<Destination>((registers_of(AvioBoard::krd31).alive >> 4) & 3);
 }
 
 inline bool can_handle_hdcp() {
-    return (avio_status.boards[tbx205].alive & 0x40) != 0;
+    return (registers_of(AvioBoard::tbx205).alive & 0x40) != 0;
 }
 
-// The public readers' work on an open status file, with their results.
+// The public readers' work on an open status file, with their results and messages.
 int read_config(FILE *file);
 int scan_alive(FILE *file);
 

@@ -11,8 +11,9 @@
 
 namespace vlsys {
 
-static void check_table(AvioBoard board) {
-    if (avio_status.boards[board].device_id != 0)
+// Waits, for 29 seconds at most, unless the board's Alive register is in the table.
+static void wait_for_board(AvioBoard board) {
+    if (registers_of(board).device_id != 0)
         return;
     vlsys_log(LOG_WARNING, "%s", "avio_status is not initialized. rescan status");
     vlsys_avio_wait_ready();
@@ -22,7 +23,8 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
     char line[8192];
     char status_text[8] = "";
     size_t length = 0;
-    while (!ferror(stream) && read_line(stream, line, sizeof line) > 0) {
+    int result = 0;
+    while ((result = read_line(stream, line, sizeof line)) > 0) {
         vlsys_log(LOG_DEBUG, "%s", line);
         char *rest = nullptr;
         const char *const key = strtok_r(line, " \t:\n", &rest);
@@ -32,10 +34,8 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
         }
         vlsys_strlcpy(status_text, line, sizeof status_text);
     }
-    if (ferror(stream)) {
-        vlsys_log(LOG_ERR, "fgets(%s): %m", serial_number_command);
-        return -errno;
-    }
+    if (result < 0)
+        return log_errno("fgets(%s)", serial_number_command);
     *status = static_cast<int>(strtol(status_text, nullptr, 10)); // seven characters always fit
     return static_cast<int>(length);
 }
@@ -45,11 +45,12 @@ int read_serial_number(FILE *stream, char *buffer, size_t size, int *status) {
 using namespace vlsys;
 
 int vlsys_get_destination(char *buffer, size_t size) {
-    check_table(krd31);
-    const int field = destination();
-    if (field != destination_sy && field != destination_cn)
-        vlsys_log(LOG_WARNING, "unknown destination: %d, fallback to \"SY\"", field);
-    const size_t length = vlsys_strlcpy(buffer, field == destination_cn ? "CN" : "SY", size);
+    wait_for_board(AvioBoard::krd31);
+    const Destination code = destination();
+    if (code != Destination::sy && code != Destination::cn)
+        vlsys_log(LOG_WARNING, "unknown destination: %d, fallback to \"SY\"",
+                  static_cast<int>(code));
+    const size_t length = vlsys_strlcpy(buffer, code == Destination::cn ? "CN" : "SY", size);
     vlsys_log(LOG_INFO, "Destination: %s", size > 0 ? buffer : "");
     return static_cast<int>(length);
 }
@@ -57,27 +58,25 @@ int vlsys_get_destination(char *buffer, size_t size) {
 int vlsys_get_fps(void) {
     char code[8];
     vlsys_get_destination(code, sizeof code);
-    const int field = frame_frequency();
-    int fps = field == frequency_50i ? 50 : 59;
-    if (field != frequency_50i && field != frequency_59_94i) {
+    const FrameFrequency frequency = frame_frequency();
+    int fps = frequency == FrameFrequency::hz50 ? 50 : 59;
+    if (frequency != FrameFrequency::hz50 && frequency != FrameFrequency::hz59_94) {
         fps = strcmp(code, "CN") == 0 ? 50 : 59;
-        vlsys_log(LOG_WARNING, "unknown fps: %d, fallback to %d", field, fps);
+        vlsys_log(LOG_WARNING, "unknown fps: %d, fallback to %d", static_cast<int>(frequency), fps);
     }
     vlsys_log(LOG_INFO, "FPS: %d", fps);
     return fps;
 }
 
 int vlsys_get_hdcp_capability(void) {
-    check_table(tbx205);
+    wait_for_board(AvioBoard::tbx205);
     return can_handle_hdcp() ? 1 : 0;
 }
 
 int vlsys_get_serial_number(char *buffer, size_t size) {
     FILE *const stream = vlsys_popen(serial_number_command);
-    if (!stream) {
-        vlsys_log(LOG_ERR, "popen(\"%s\", \"re\"): %m", serial_number_command);
-        return -errno;
-    }
+    if (!stream)
+        return log_errno("popen(\"%s\", \"re\")", serial_number_command);
     int status = 0;
     const int length = read_serial_number(stream, buffer, size, &status);
     const int closed = vlsys_pclose(stream);
@@ -86,10 +85,10 @@ int vlsys_get_serial_number(char *buffer, size_t size) {
         return length;
     const int exit_code = (status >> 8) & 0xff;
     if ((status & 0x7f) != 0)
-        return -200 - status;
+        return VLSYS_SERIAL_COMMAND_FAILED - status;
     if (exit_code != 0)
-        return -200 - exit_code;
+        return VLSYS_SERIAL_COMMAND_FAILED - exit_code;
     if (closed != 0)
-        return -301 - closed;
+        return VLSYS_SERIAL_DIRECT_FAILED - closed;
     return length;
 }

@@ -11,7 +11,7 @@ namespace vlsys {
 static time_t modification_time(FILE *file) {
     struct stat status = {};
     if (fstat(fileno(file), &status) != 0) {
-        vlsys_log(LOG_ERR, "fstat(%s): %m", version_path);
+        log_errno("fstat(%s)", version_path);
         return 0;
     }
     return status.st_mtime;
@@ -20,7 +20,7 @@ static time_t modification_time(FILE *file) {
 static bool read_version(FILE *file, char *version, size_t size) {
     errno = 0; // an empty file is no error
     if (read_line(file, version, size) <= 0) {
-        vlsys_log(LOG_ERR, "fgets(%s): %m", version_path);
+        log_errno("fgets(%s)", version_path);
         return false;
     }
     version[strcspn(version, "\n")] = '\0';
@@ -38,7 +38,7 @@ void vlsys_get_version(char *buffer, size_t size, time_t *time) {
     char line[1024];
     const File file(fopen(version_path, "re"));
     if (!file) {
-        vlsys_log(LOG_ERR, "fopen(%s): %m", version_path);
+        log_errno("fopen(%s)", version_path);
     } else {
         modified = modification_time(file.get());
         if (read_version(file.get(), line, sizeof line))

@@ -621,7 +621,9 @@ VLSYS_API int vlsys_pclose(FILE *stream);
  * /proc/driver/VlAvio/status, which these operations read into one table of the library; the
  * product information below is taken from that table. A register that the file does not give keeps
  * its value in the table, and each is 0 until it was read. Register lines under the header of a
- * board with another device id are skipped.
+ * board with another device id are skipped. A status file that cannot be read to its end counts as
+ * one that could not be opened; the registers before that point are in the table. The table belongs
+ * to one thread.
  */
 
 /* Device ids of the boards. */
@@ -638,14 +640,14 @@ VLSYS_API int vlsys_pclose(FILE *stream);
 #define VLSYS_AVIO_READY 0xff
 #define VLSYS_AVIO_UNKNOWN_DEVICE 0x100 /* a board with another device id was seen */
 #define VLSYS_AVIO_STRAY_ALIVE 0x200    /* an Alive register stands before any board */
-#define VLSYS_AVIO_NO_DRIVER 0x400      /* the status file could not be opened */
+#define VLSYS_AVIO_NO_DRIVER 0x400      /* alone: the status file could not be opened or read */
 
 /*
  * Reads the Config register of every board. A value of more than 32 bits, or below 0, is taken as
  * 0xffffffff.
  *
- * Returns 0, or -1 when the file could not be opened, a board with another device id was seen
- * (logged at LOG_ERR as "unknown device id: ..."), or a register stands before any board; what
+ * Returns 0, or -1 when the file could not be opened or read, a board with another device id was
+ * seen (logged at LOG_ERR as "unknown device id: ..."), or a register stands before any board; what
  * could be assigned is in the table even then.
  */
 VLSYS_API int vlsys_avio_read_config(void);
@@ -672,14 +674,14 @@ VLSYS_API int vlsys_avio_scan_alive(void);
 
 /*
  * Waits until all boards are alive: up to 960 scans, about 30 ms apart, which is a little under 29
- * seconds. A missing status file and an interrupted sleep end the wait at once. Then reads the
- * Config registers and reports.
+ * seconds. A status file that is missing or cannot be read, and a signal that interrupts a sleep,
+ * end the wait at once. Then reads the Config registers and reports.
  *
- * Returns 1 when the boards came up, or there is no status file, and none booted from its backup
+ * Returns 1 when the boards came up, or no status file can be read, and none booted from its backup
  * image; else 0.
  * Logs the beginning and the end of the wait at LOG_INFO ("can't get VlAvio status. Emulator ?" at
- * LOG_WARNING without a status file), and each Config register at LOG_INFO, with a LOG_WARNING for
- * a boot from backup or an illegal value. With the boards up, or without a status file, frame
+ * LOG_WARNING without a status), and each Config register at LOG_INFO, with a LOG_WARNING for a
+ * boot from backup or an illegal value. With the boards up, or without a status, frame
  * frequency, destination and HDCP capability follow at LOG_INFO; else "timeout (<seconds>). " at
  * LOG_ERR, and the boards not found and those not alive at LOG_INFO.
  */
@@ -720,16 +722,19 @@ VLSYS_API int vlsys_get_hdcp_capability(void);
  * closes it with vlsys_pclose, which takes 1 second more when the surrogate parent ran it.
  *
  * The last line of the output is taken as the command's wait status, which the surrogate parent
- * sends; a text that does not begin with a number counts as 0.
+ * sends; a text that does not begin with a number counts as 0. A listing that is cut, by a
+ * surrogate parent that goes away, is taken as it came: the unit is named by the digits that
+ * arrived.
  *
  * Returns
  *   the length of the whole serial number (the text was cut when that is `size` or more);
  *   0 when the output has no serial number: the buffer is then left as it was;
  *   the negated errno when the command could not be started, or its output not read;
- *   -200 minus the wait status when the command was ended by a signal;
- *   -200 minus the exit code when that is not 0;
- *   -301 minus the result of vlsys_pclose when that is not 0 (only when the command ran without the
- *   surrogate parent; -300 when pclose failed).
+ *   VLSYS_SERIAL_COMMAND_FAILED (-200) minus the wait status when a signal ended the command;
+ *   VLSYS_SERIAL_COMMAND_FAILED minus the exit code when that is not 0;
+ *   VLSYS_SERIAL_DIRECT_FAILED (-301) minus the wait status that vlsys_pclose gives, when that is
+ *   not 0 (only when the command ran without the surrogate parent);
+ *   VLSYS_SERIAL_PCLOSE_FAILED (-300) when it gives none.
  * After a failure the buffer may hold a serial number that was read before it.
  * Logs each line of the output at LOG_DEBUG.
  */
@@ -748,6 +753,9 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 /*
  * A check code names what is wrong with a setting: the interface concerned by its position in the
  * list (0 for the first or only one, and for faults that concern no single interface), the field
+#define VLSYS_SERIAL_COMMAND_FAILED (-200)
+#define VLSYS_SERIAL_PCLOSE_FAILED (-300)
+#define VLSYS_SERIAL_DIRECT_FAILED (-301)
  * and the kind of fault. Every check code is VLSYS_CHECK_CODE(0, 0, 0), that is 0x100, or above.
  */
 #define VLSYS_CHECK_CODE(position, field, kind) ((((position) + 1) << 8) | ((field) << 4) | (kind))
