@@ -10,23 +10,26 @@
 
 namespace vlsys {
 
-int64_t read_block_size(FILE *file) {
+// The size in bytes that the first line tells in sectors. Returns it, or the negated errno (not
+// logged).
+static int64_t read_block_size(FILE *file) {
     constexpr int64_t sector_size = 512;
     constexpr int64_t sector_limit = INT64_MAX / sector_size;
-    char line[64];
-    if (read_line(file, line, sizeof line) <= 0)
-        return 0;
+    char line[64] = ""; // of an empty file
+    const int result = read_line(file, line, sizeof line);
+    if (result < 0)
+        return result;
     const unsigned long long sectors = strtoull(line, nullptr, 10);
     return sectors < sector_limit ? static_cast<int64_t>(sectors) * sector_size : INT64_MAX;
 }
 
 int64_t read_block_size_file(const char *path) {
     File file(fopen(path, "re"));
-    if (!file) {
-        vlsys_log(LOG_ERR, "fopen(%s): %m", path);
-        return -errno;
-    }
+    if (!file)
+        return log_errno("fopen(%s)", path);
     const int64_t size = read_block_size(file.get());
+    if (size < 0)
+        return log_errno("fgets(%s)", path);
     file.reset();
     vlsys_log(LOG_INFO, "%s: %" PRId64, path, size);
     return size;
@@ -55,10 +58,8 @@ int64_t vlsys_get_block_device_size(const char *path) {
     const char *const slash = strrchr(resolved, '/');
     const char *const base = slash ? slash + 1 : resolved;
     const Text name(strndup(base, VLSYS_PATH_SIZE));
-    if (!name) {
-        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", base, VLSYS_PATH_SIZE);
-        return -errno;
-    }
+    if (!name)
+        return log_errno("strndup(%s, %d)", base, VLSYS_PATH_SIZE);
     vlsys_log(LOG_DEBUG, "dev: %s", name.get());
 
     char file[VLSYS_PATH_SIZE + sizeof block_path + sizeof "/sda//size"];

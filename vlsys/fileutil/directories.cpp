@@ -9,36 +9,33 @@ namespace vlsys {
 static int make_level(const char *path, unsigned int mode) {
     if (mkdir(path, mode) == 0 || errno == EEXIST)
         return 0;
-    vlsys_log(LOG_ERR, "mkdir(%s, %04o): %m", path, mode);
-    return -1;
+    return log_errno("mkdir(%s, %04o)", path, mode);
 }
+
+namespace {
 
 struct CloseWalk {
     const char *path;
 
     void operator()(FTS *walk) const {
         if (fts_close(walk) != 0)
-            vlsys_log(LOG_ERR, "fts_close: %s: %m", path);
+            log_errno("fts_close: %s", path);
     }
 };
 using Walk = std::unique_ptr<FTS, CloseWalk>;
 
+} // namespace
+
 // The walk changes the working directory: calls take fts_accpath, messages fts_path.
 static int remove_file(const FTSENT *entry) {
-    if (unlink(entry->fts_accpath) == 0)
-        return 0;
-    vlsys_log(LOG_ERR, "unlink %s: %m", entry->fts_path);
-    return errno;
+    return unlink(entry->fts_accpath) == 0 ? 0 : log_errno("unlink %s", entry->fts_path);
 }
 
 static int remove_directory(const FTSENT *entry) {
-    if (rmdir(entry->fts_accpath) == 0)
-        return 0;
-    vlsys_log(LOG_ERR, "rmdir %s: %m", entry->fts_path);
-    return errno;
+    return rmdir(entry->fts_accpath) == 0 ? 0 : log_errno("rmdir %s", entry->fts_path);
 }
 
-// 0, or the errno of a failed removal.
+// 0, or the negated errno of a failed removal.
 static int visit(FTS *walk, FTSENT *entry) {
     switch (entry->fts_info) {
     case FTS_D:
@@ -74,7 +71,7 @@ static Text without_slashes(const char *path) {
         length--;
     Text copy(strndup(path, length));
     if (!copy)
-        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", path, static_cast<int>(length));
+        log_errno("strndup(%s, %d)", path, static_cast<int>(length));
     return copy;
 }
 
@@ -84,6 +81,24 @@ static FTSENT *next_entry(FTS *walk) {
     return fts_read(walk);
 }
 
+// Returns 0, or the negated errno of what ended the work, logged.
+static int remove_tree(const char *path) {
+    const Text root = without_slashes(path);
+    if (!root)
+        return -errno;
+    char *const roots[] = {root.get(), nullptr};
+    const Walk walk(fts_open(roots, FTS_NOSTAT | FTS_PHYSICAL | FTS_XDEV, nullptr),
+                    CloseWalk{path});
+    if (!walk)
+        return log_errno("fts_open  %s", path);
+    while (FTSENT *entry = next_entry(walk.get())) {
+        const int result = visit(walk.get(), entry);
+        if (result < 0)
+            return result;
+    }
+    return errno == 0 ? 0 : log_errno("fts_read %s", path);
+}
+
 } // namespace vlsys
 
 using namespace vlsys;
@@ -91,17 +106,17 @@ using namespace vlsys;
 int vlsys_mkdir(const char *path, unsigned int mode) {
     const Text copy(strndup(path, VLSYS_PATH_SIZE));
     if (!copy) {
-        vlsys_log(LOG_ERR, "strndup(%s, %d): %m", path, VLSYS_PATH_SIZE);
+        log_errno("strndup(%s, %d)", path, VLSYS_PATH_SIZE);
         return -1;
     }
     char *const start = copy.get()[0] == '/' ? copy.get() + 1 : copy.get();
     for (char *slash = strchr(start, '/'); slash; slash = strchr(slash + 1, '/')) {
         *slash = '\0';
-        if (make_level(copy.get(), mode) != 0)
+        if (make_level(copy.get(), mode) < 0)
             return -1;
         *slash = '/';
     }
-    return make_level(copy.get(), mode);
+    return make_level(copy.get(), mode) < 0 ? -1 : 0;
 }
 
 int vlsys_remove_tree(const char *path) {
@@ -109,22 +124,5 @@ int vlsys_remove_tree(const char *path) {
         return EFAULT;
     if (path[0] == '\0')
         return ENOENT;
-    const Text root = without_slashes(path);
-    if (!root)
-        return errno;
-    char *const roots[] = {root.get(), nullptr};
-    const Walk walk(fts_open(roots, FTS_NOSTAT | FTS_PHYSICAL | FTS_XDEV, nullptr),
-                    CloseWalk{path});
-    if (!walk) {
-        vlsys_log(LOG_ERR, "fts_open  %s: %m", path);
-        return errno;
-    }
-    while (FTSENT *entry = next_entry(walk.get())) {
-        const int error = visit(walk.get(), entry);
-        if (error != 0)
-            return error;
-    }
-    if (errno != 0)
-        vlsys_log(LOG_ERR, "fts_read %s: %m", path);
-    return errno;
+    return -remove_tree(path);
 }

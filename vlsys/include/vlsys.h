@@ -973,7 +973,8 @@ VLSYS_API int64_t vlsys_realpath(char *buffer, const char *path, size_t size);
  * /sys/block/<name>/size for every other name.
  *
  * Returns the size (0 when the file is empty or holds no number), -EFAULT for a null path (not
- * logged), or the negated errno. Logs the device's name at LOG_DEBUG and the size at LOG_INFO.
+ * logged), or the negated errno, also that of a size file that opens and cannot be read. Logs the
+ * device's name at LOG_DEBUG and the size at LOG_INFO.
  */
 VLSYS_API int64_t vlsys_get_block_device_size(const char *path);
 
