@@ -3,7 +3,9 @@
  *
  * A program calls vlsys_init first and vlsys_exit last; every other operation is a plain
  * synchronous call on the caller's thread. The library has no threads and no locks: its few
- * process-wide states (paths, log, driver status table, primary interface) belong to one thread.
+ * process-wide states (paths, log, driver status table, primary interface) belong to one thread,
+ * and so does every operation that is not said to run on any thread. Setters change the umask of
+ * the whole process for a moment.
  *
  * Setters change configuration files only, unless said otherwise. What they write takes effect at
  * the next network restart or boot. Rewriting a sysconfig file or the sysctl drop-in drops its
@@ -80,6 +82,10 @@ extern "C" {
  * opened on /dev/null first, so that no file or socket of the library gets its number; vlsys_exit
  * leaves it open.
  *
+ * Before it, and after vlsys_exit, VL_ROOT is ignored: the root path counts as empty, and a setter
+ * changes the running system's own files. vlsys_init and vlsys_exit run on one thread, while no
+ * other operation does.
+ *
  * Returns 0, or the negated errno when a path could not be allocated; the library is then not
  * started.
  * Logs version and build date at LOG_INFO; on a started library "initialized 1 times" at LOG_DEBUG.
@@ -95,7 +101,7 @@ VLSYS_API void vlsys_exit(void);
  *
  * Returns the length of the whole path, also when it was cut or the buffer is null (nothing is
  * written); 0 when the size is 0 (nothing is written); VLSYS_NOT_STARTED (-200) when the library is
- * not started. Logs nothing.
+ * not started. Logs nothing. They may run on any thread.
  */
 #define VLSYS_NOT_STARTED (-200)
 VLSYS_API int64_t vlsys_get_path_root(char *buffer, size_t size);
@@ -106,7 +112,8 @@ VLSYS_API int64_t vlsys_get_path_data(char *buffer, size_t size);
 
 /*
  * Copies the source, cut to size - 1 bytes, and terminates it; writes nothing when the size is 0.
- * Returns the length of the source: the copy was cut when that is `size` or more.
+ * Returns the length of the source: the copy was cut when that is `size` or more. May run on any
+ * thread, as the next one may.
  */
 VLSYS_API size_t vlsys_strlcpy(char *destination, const char *source, size_t size);
 
@@ -127,8 +134,10 @@ VLSYS_API size_t vlsys_strlcat(char *destination, const char *source, size_t siz
  * The message goes to the system log as "[<thread id>]: <message>"; the first one opens it with the
  * program's short name, LOG_PID and LOG_LOCAL0 unless vlsys_openlog came before. In
  * standard-output mode it goes there, after the prefix "<ident>[<process id>]: <<level>>: [<thread
- * id>]: " (none at LOG_DEBUG), and a line feed follows unless the format itself ends in one.
- * Blocks, without a limit, while the log daemon or the reader of standard output takes nothing.
+ * id>]: " (none at LOG_DEBUG), and a line feed follows unless the format itself ends in one. The
+ * line is whole, whatever other threads print.
+ * Blocks, without a limit, while the log daemon or the reader of standard output takes nothing. May
+ * run on any thread once the log is open.
  */
 VLSYS_API void vlsys_log(int priority, const char *format, ...) VLSYS_PRINTF(2, 3);
 VLSYS_API void vlsys_vlog(int priority, const char *format, va_list arguments) VLSYS_PRINTF(2, 0);
@@ -173,6 +182,7 @@ VLSYS_API int vlsys_setlogmask(int mask);
  * -EFAULT  null zone (not logged);
  * -ENOENT  empty zone (not logged), no such zone file, zone file that does not begin with "TZif",
  *          no clock file;
+ * -ENAMETOOLONG  zone whose file has a path of over 4095 bytes;
  * -EIO     zone file of fewer than 4 bytes;
  * else the negated errno of the step that failed.
  * After a failure in the zone file or the link /etc/localtime is what it was; after one in the
@@ -183,7 +193,6 @@ VLSYS_API int vlsys_setlogmask(int mask);
 VLSYS_API int vlsys_set_timezone(const char *zone);
 
 /*
- * -ENAMETOOLONG  zone whose file has a path of over 4095 bytes;
  * The zone name of <root>/etc/sysconfig/clock: what stands between the ZONE=" and the last double
  * quote of the first line that has a ZONE=" (to the end of the line, line feed included, when no
  * other quote follows). An unquoted zone is not found. Lines over 79 bytes count as several.
@@ -197,7 +206,7 @@ VLSYS_API size_t vlsys_get_timezone(char *buffer, size_t size);
 /*
  * The present offset of local time from UTC, such as "+0800", in a buffer of 6 bytes or more.
  * Returns its length, 5; 0 when the buffer is null or too small (its content is then unspecified),
- * or the local time cannot be told (logged).
+ * or the local time cannot be told (logged). May run on any thread.
  */
 VLSYS_API size_t vlsys_get_utc_offset(char *buffer, size_t size);
 
@@ -526,7 +535,8 @@ VLSYS_API pid_t vlsys_spawn_direct(const char *command);
  *   exited (<name>), abnormally                        (stopped, not ended)
  * with " pid: <pid>" after the first word when the process id is not 0. A null name shows as "?".
  *
- * Returns the exit code (0 to 255) of a normal exit, 256 for any other status. Logs nothing.
+ * Returns the exit code (0 to 255) of a normal exit, 256 for any other status. Logs nothing. May
+ * run on any thread.
  */
 VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const char *name,
                                      int status);
@@ -544,6 +554,9 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  *   line feed the operation fails with EINVAL, and nothing is sent. A command that is run directly
  *   may have line feeds.
  * - A request that could only be sent in part is not run.
+ * - A command that is run directly is a child of the caller. When SIGCHLD is ignored, or a handler
+ *   of the caller's reaps every child, its end cannot be told: vlsys_system and vlsys_pclose then
+ *   return -1 (ECHILD), and vlsys_get_serial_number -300, although the command ran.
  * - When connected, they log the working directory at LOG_DEBUG and the command at LOG_INFO
  *   (vlsys_popen: the whole request at LOG_DEBUG), and what each says below. A reply that is
  *   missing or is no number is not logged. A command that is run directly is not logged, but for
@@ -559,9 +572,6 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  */
 #define VLSYS_SURROGATE_PORT "12865"
 
- * - A command that is run directly is a child of the caller. When SIGCHLD is ignored, or a handler
- *   of the caller's reaps every child, its end cannot be told: vlsys_system and vlsys_pclose then
- *   return -1 (ECHILD), and vlsys_get_serial_number -300, although the command ran.
 /*
  * Connects to a TCP service of 127.0.0.1, given as a decimal port number. Blocks up to about 2
  * minutes, by the kernel's settings, while the service takes no connection.
@@ -690,6 +700,11 @@ VLSYS_API int vlsys_avio_wait_ready(void);
 /* ---- Product information --------------------------------------------------------------------- */
 
 /*
+ * The serial number and the version may be read on any thread; what comes from the table of the
+ * video I/O driver, on the thread that the table belongs to.
+ */
+
+/*
  * The unit's destination code, "SY" or "CN", cut to a buffer of `size` bytes (3 hold it all). As
  * long as the status of the KRD-31 board has not been read, the first step is
  * vlsys_avio_wait_ready, with its time and messages; without the driver that is so at every call.
@@ -738,6 +753,9 @@ VLSYS_API int vlsys_get_hdcp_capability(void);
  * After a failure the buffer may hold a serial number that was read before it.
  * Logs each line of the output at LOG_DEBUG.
  */
+#define VLSYS_SERIAL_COMMAND_FAILED (-200)
+#define VLSYS_SERIAL_PCLOSE_FAILED (-300)
+#define VLSYS_SERIAL_DIRECT_FAILED (-301)
 VLSYS_API int vlsys_get_serial_number(char *buffer, size_t size);
 
 /*
@@ -753,9 +771,6 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 /*
  * A check code names what is wrong with a setting: the interface concerned by its position in the
  * list (0 for the first or only one, and for faults that concern no single interface), the field
-#define VLSYS_SERIAL_COMMAND_FAILED (-200)
-#define VLSYS_SERIAL_PCLOSE_FAILED (-300)
-#define VLSYS_SERIAL_DIRECT_FAILED (-301)
  * and the kind of fault. Every check code is VLSYS_CHECK_CODE(0, 0, 0), that is 0x100, or above.
  */
 #define VLSYS_CHECK_CODE(position, field, kind) ((((position) + 1) << 8) | ((field) << 4) | (kind))
@@ -925,6 +940,11 @@ VLSYS_API int vlsys_set_network(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, v
                                 vlsys_dns *dns, char *hostname, int *step);
 
 /* ---- Files and directories ------------------------------------------------------------------- */
+
+/*
+ * These may run on any thread; but vlsys_remove_tree changes the working directory of the whole
+ * process while it works.
+ */
 
 /*
  * Rebuilds the font cache: runs "fc-cache" with vlsys_system and waits for it without a limit.
