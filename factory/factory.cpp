@@ -1,6 +1,7 @@
 // The factory set-up tool: run once on a unit, puts its system settings into their factory state.
 #include "vlsys.h"
 
+#include <csignal>
 #include <cstring>
 
 // The numbers are fixed: technicians know each failure by its own.
@@ -60,7 +61,15 @@ static int factory_init_network() {
     return 0;
 }
 
+// What the tool was started with must not decide how it ends.
+static void make_independent_of_caller() {
+    setvbuf(stdout, nullptr, _IOLBF, 0); // into a pipe, too: the technician sees where it stands
+    signal(SIGCHLD, SIG_DFL);            // ignored, no command's exit status would reach the tool
+    signal(SIGPIPE, SIG_IGN);            // a reader that leaves must not stop it half-way
+}
+
 int main() {
+    make_independent_of_caller();
     if (vlsys_init() != 0)
         return failed(__func__, 112);
     if (factory_init_timezone() != 0)
