@@ -33,12 +33,12 @@ static int factory_init_timezone() {
     return 0;
 }
 
-// Model word and serial number; at most 8 characters of the number fit.
-static int factory_make_hostname(char (&hostname)[16]) {
+// Model word and serial number; of the number at most 8 characters fit into the tool's 16 bytes.
+static int factory_make_hostname(char *hostname, size_t size) {
     char serial[16] = "00000"; // what a unit without a serial number is named after
     if (vlsys_get_serial_number(serial, sizeof serial) < 0)
         return failed(__func__, 53);
-    return snprintf(hostname, sizeof hostname, "rhx416-%s", serial) < 0 ? -1 : 0;
+    return snprintf(hostname, size, "rhx416-%s", serial) < 0 ? -1 : 0;
 }
 
 static int factory_init_network() {
@@ -54,7 +54,7 @@ static int factory_init_network() {
         return failed(__func__, 82);
     if (vlsys_set_dns_settings(&no_dns) != 0)
         return failed(__func__, 86);
-    if (factory_make_hostname(hostname) != 0)
+    if (factory_make_hostname(hostname, sizeof hostname) != 0)
         return failed(__func__, 90);
     if (vlsys_set_hostname(hostname) != 0)
         return failed(__func__, 94);

@@ -16,13 +16,13 @@ static const char *environment(const char *name, const char *fallback) {
     return value ? value : fallback;
 }
 
-static int join(Text &path, const char *root, const char *rest, const char *failure) {
+static int join(Text *path, const char *root, const char *rest, const char *failure) {
     const size_t size = strlen(root) + strlen(rest) + 1;
-    path.reset(static_cast<char *>(malloc(size)));
-    if (!path)
+    path->reset(static_cast<char *>(malloc(size)));
+    if (!*path)
         return log_errno("%s", failure);
-    vlsys_strlcpy(path.get(), root, size);
-    vlsys_strlcat(path.get(), rest, size);
+    vlsys_strlcpy(path->get(), root, size);
+    vlsys_strlcat(path->get(), rest, size);
     return 0;
 }
 
@@ -34,10 +34,10 @@ int set_up_paths() {
     path_root.reset(strdup(root));
     if (!path_root)
         return log_errno("%s", "strdup(path_root)");
-    const int result = join(path_prefix, root, prefix, "malloc(path_prefix)");
+    const int result = join(&path_prefix, root, prefix, "malloc(path_prefix)");
     if (result < 0)
         return result;
-    return join(path_data, root, data, "malloc(path_data)");
+    return join(&path_data, root, data, "malloc(path_data)");
 }
 
 void drop_paths() {
