@@ -1,7 +1,7 @@
 // Address texts under any field, and host names.
 #include "netstate/address.h"
 #include "fuzz.h"
-#include "netconf/interfaces.h"
+#include "netconf/hostname.h"
 
 static int convert(bool ipv6, std::string &text, int code) {
     sockaddr_in6 out;

@@ -1,6 +1,6 @@
 // The resolver's file, two interfaces' files, the network file, switches, two routing tables.
 #include "fuzz.h"
-#include "netconf/mode.h"
+#include "netconf/get_mode.h"
 #include <net/if.h>
 
 extern "C" void __wrap_if_freenameindex(void * /*list*/) {}

@@ -1,8 +1,9 @@
 #include "core/paths.h"
 #include "fixture.h"
 #include "netconf/edit.h"
+#include "netconf/get_mode.h"
+#include "netconf/hostname.h"
 #include "netconf/interfaces.h"
-#include "netconf/mode.h"
 #include "vlsys.h"
 
 #include <algorithm>

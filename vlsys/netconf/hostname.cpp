@@ -1,9 +1,13 @@
+#include "netconf/hostname.h"
+
 #include "core/log.h"
 #include "core/paths.h"
 #include "netconf/edit.h"
-#include "netconf/interfaces.h"
 
+#include <cerrno>
+#include <cstdio>
 #include <cstring>
+#include <unistd.h>
 
 namespace vlsys {
 

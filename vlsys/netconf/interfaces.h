@@ -38,12 +38,9 @@ int compare_natural(const char *a, const char *b, int n);
 int compare_ifname(const void *a, const void *b);
 
 // The unit's primary interface: eth0, else enp0s25, else the first of the list. Found once and kept
-// for the life of the process. Returns its index with the name in `out` (VLSYS_IFNAME_SIZE bytes);
-// 0 when there is no interface; -14 for a null `out`.
+// for the life of the process. For code that works on one interface where none is named; no setter
+// or reader of the library does. Returns its index with the name in `out` (VLSYS_IFNAME_SIZE
+// bytes); 0 when there is no interface; -14 for a null `out`.
 int get_primary_ifname(char *out);
-
-// 0 when the name is a well-formed host or domain name (the empty text is), else -1. Logs a name or
-// label that is too long; silent for a null name and for a character that is out of place.
-int check_hostname_format(const char *name);
 
 } // namespace vlsys

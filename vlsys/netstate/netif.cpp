@@ -1,5 +1,5 @@
 #include "core/log.h"
-#include "netconf/mode.h"
+#include "netconf/get_mode.h"
 #include "netstate/address.h"
 
 #include <bit>

@@ -2,7 +2,7 @@
 
 #include "core/log.h"
 #include "core/text.h"
-#include "netconf/interfaces.h"
+#include "netconf/hostname.h"
 #include "netstate/address.h"
 
 #include <bit>

@@ -1,4 +1,4 @@
-#include "netconf/mode.h"
+#include "netconf/get_mode.h"
 
 #include "core/lines.h"
 #include "core/log.h"
