@@ -413,6 +413,7 @@ VLSYS_API int vlsys_get_hostname(char *name);
  * LOG_INFO); 420 for a name that breaks these rules; else the positive errno of the failed step:
  * when the kernel refuses the name, the file has it already. Waits for the file to reach the disk.
  */
+#define VLSYS_HOSTNAME_REFUSED 420
 VLSYS_API int vlsys_set_hostname_immediately(const char *name);
 
 /* ---- Network state --------------------------------------------------------------------------- */

@@ -7,34 +7,19 @@
 #include "netconf/keys.h"
 
 #include <cstring>
+#include <iterator>
 #include <string_view>
 
 namespace vlsys {
 
-static constexpr Cell domain = field_1;
-static constexpr Cell server_1 = field_2;
-static constexpr Cell server_2 = field_3;
-
-enum DnsColumn { other_interface, dns_off, dns_dhcp, dns_manual };
-
-static constexpr KeyRow<4> dns_keys[] = {
-    // any other interface; the DNS interface: Off, DHCP, Manual
-    {"PEERDNS", {no, no, yes, yes}},
-    {"DOMAIN", {removed, removed, removed, domain}},
-    {"DNS1", {removed, removed, removed, server_1}},
-    {"DNS2", {removed, removed, removed, server_2}},
-};
-
 namespace {
 
-// A record's texts, terminated.
+// The texts that the DNS interface's file may get from the record; server_2 is null when empty.
 struct DnsTexts {
-    explicit DnsTexts(const vlsys_dns &dns)
-        : domain(dns.domain), server{FieldText(dns.server[0]), FieldText(dns.server[1])} {}
-
-    FieldText<VLSYS_HOSTNAME_SIZE> domain;
-    FieldText<VLSYS_ADDR6_SIZE> server[2];
+    const char *domain, *server_1, *server_2;
 };
+
+enum class DnsColumn : uint8_t { other_interface, off, manual, dhcp };
 
 // What an interface's file says about DNS.
 struct DnsSettings {
@@ -44,33 +29,48 @@ struct DnsSettings {
 
 } // namespace
 
+using enum Action;
+static constexpr auto domain = &DnsTexts::domain;
+static constexpr auto server_1 = &DnsTexts::server_1;
+static constexpr auto server_2 = &DnsTexts::server_2;
+
+// clang-format off
+static constexpr KeyRow<DnsTexts, 4> dns_keys[] = {
+    // DNS        other interface  Off      Manual    DHCP
+    {"PEERDNS",  {"no",            "no",    "yes",    "yes"}},
+    {"DOMAIN",   {removed,         removed, domain,   removed}},
+    {"DNS1",     {removed,         removed, server_1, removed}},
+    {"DNS2",     {removed,         removed, server_2, removed}},
+};
+// clang-format on
+
 static DnsColumn column_of(const char *name, const vlsys_dns &dns) {
     if (strncmp(name, dns.iface, sizeof dns.iface) != 0)
-        return other_interface;
+        return DnsColumn::other_interface;
     switch (dns.mode) {
     case VLSYS_MODE_OFF:
-        return dns_off;
+        return DnsColumn::off;
     case VLSYS_MODE_DHCP:
-        return dns_dhcp;
+        return DnsColumn::dhcp;
     default:
-        return dns_manual;
+        return DnsColumn::manual;
     }
 }
 
 static void log_column(const char *name, DnsColumn column, const DnsTexts &texts) {
     switch (column) {
-    case other_interface:
+    case DnsColumn::other_interface:
         vlsys_log(LOG_DEBUG, "PEERDNS=no (%s)", name);
         break;
-    case dns_off:
+    case DnsColumn::off:
         vlsys_log(LOG_INFO, "DNS OFF (%s)", name);
         break;
-    case dns_dhcp:
-        vlsys_log(LOG_INFO, "DNS DHCP (%s)", name);
+    case DnsColumn::manual:
+        vlsys_log(LOG_INFO, "DNS %s, %s, %s (%s)", texts.domain, texts.server_1,
+                  texts.server_2 ? texts.server_2 : "", name);
         break;
-    case dns_manual:
-        vlsys_log(LOG_INFO, "DNS %s, %s, %s (%s)", texts.domain.text, texts.server[0].text,
-                  texts.server[1].text, name);
+    case DnsColumn::dhcp:
+        vlsys_log(LOG_INFO, "DNS DHCP (%s)", name);
     }
 }
 
@@ -78,19 +78,40 @@ static int set_dns_of(const char *name, const vlsys_dns &dns, const DnsTexts &te
     const SystemPath path(ifcfg_prefix, name);
     vlsys_log(LOG_DEBUG, "%s", path.text);
     const DnsColumn column = column_of(name, dns);
-    if (column == dns_manual && texts.server[0].is_empty())
-        return EINVAL;
+    if (column == DnsColumn::manual && texts.server_1[0] == '\0')
+        return -EINVAL;
     log_column(name, column, texts);
 
-    ItemList list;
-    list.add(dns_keys, column,
-             {{texts.domain.text, texts.server[0].text,
-               texts.server[1].is_empty() ? nullptr : texts.server[1].text}});
+    edit_item array[std::size(dns_keys)];
+    ItemList list(array);
+    list.add_column(dns_keys, column, texts);
     const auto items = list.items();
     const int result = edit(path.text, items.data(), static_cast<uint32_t>(items.size()));
     if (result < 0)
         vlsys_log(LOG_ERR, "%s", "param: failed");
-    return -result;
+    return result;
+}
+
+static int set_dns(const vlsys_dns &dns) {
+    if (dns.mode != VLSYS_MODE_OFF && dns.iface[0] == '\0')
+        return -EINVAL;
+    const InterfaceList interfaces;
+    if (interfaces.count() == 0)
+        return -ENXIO;
+    const FieldText domain_text(dns.domain);
+    const FieldText server_1_text(dns.server[0]);
+    const FieldText server_2_text(dns.server[1]);
+    const DnsTexts texts = {
+        .domain = domain_text.text,
+        .server_1 = server_1_text.text,
+        .server_2 = server_2_text.is_empty() ? nullptr : server_2_text.text,
+    };
+    for (const auto &name : interfaces) {
+        const int result = set_dns_of(name, dns, texts);
+        if (result != 0)
+            return result;
+    }
+    return 0;
 }
 
 static void read_resolver(FILE *file, vlsys_dns *dns) {
@@ -157,20 +178,7 @@ static int read_dns_mode(const InterfaceList &interfaces, uint32_t *mode) {
 using namespace vlsys;
 
 int vlsys_set_dns_settings(const vlsys_dns *dns) {
-    if (!dns)
-        return EFAULT;
-    if (dns->mode != VLSYS_MODE_OFF && dns->iface[0] == '\0')
-        return EINVAL;
-    const InterfaceList interfaces;
-    if (interfaces.count() == 0)
-        return ENXIO;
-    const DnsTexts texts(*dns);
-    for (const auto &name : interfaces) {
-        const int result = set_dns_of(name, *dns, texts);
-        if (result != 0)
-            return result;
-    }
-    return 0;
+    return dns ? -set_dns(*dns) : EFAULT;
 }
 
 int vlsys_get_dns_settings(vlsys_dns *dns) {

@@ -189,7 +189,7 @@ int edit_or_log(const char *path, std::span<const edit_item> items) {
     const int result = edit(path, items.data(), static_cast<uint32_t>(items.size()));
     if (result < 0)
         vlsys_log(LOG_ERR, "edit(%s): failed", path);
-    return -result;
+    return result;
 }
 
 } // namespace vlsys

@@ -22,7 +22,7 @@ struct edit_item {
 // logged, with the old file still in place (unless only its mode could not be set).
 int edit(const char *path, const edit_item *items, uint32_t count);
 
-// `edit`, with "edit(%s): failed" logged on failure; returns 0 or the positive errno.
+// `edit`, with "edit(%s): failed" logged on failure.
 int edit_or_log(const char *path, std::span<const edit_item> items);
 
 } // namespace vlsys

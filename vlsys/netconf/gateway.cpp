@@ -5,20 +5,47 @@
 #include "netconf/keys.h"
 
 #include <cstring>
+#include <iterator>
 
 namespace vlsys {
 
+namespace {
+
+struct NoTexts {};
+
+// Whether an interface may have a default route of its own.
+enum class RouteColumn : uint8_t { allowed, refused };
+
+} // namespace
+
+using enum Action;
+
+// clang-format off
+static constexpr KeyRow<NoTexts, 2> route_keys[] = {
+    // default route  allowed  refused
+    {"DEFROUTE",     {removed, "no"}},
+    {"METRIC",       {removed, removed}},
+    {"GATEWAY",      {removed, removed}},
+    {"GATEWAYDEV",   {removed, removed}},
+};
+// clang-format on
+
 static int write_gateway(const char *key, const char *address) {
-    const edit_item items[] = {{address[0] == '\0', key, address}};
-    return edit_or_log(SystemPath(network_path).text, items);
+    edit_item array[1];
+    ItemList list(array);
+    if (address[0] != '\0')
+        list.set(key, address);
+    else
+        list.remove(key);
+    return edit_or_log(SystemPath(network_path).text, list.items());
 }
 
-// Whether the interface may have a default route of its own. The record is a vlsys_gw4 or
-// vlsys_gw6.
+// The record is a vlsys_gw4 or vlsys_gw6.
 template <class Gateway>
-static bool has_default_route(const Gateway &gw, const char *name) {
-    return gw.mode == VLSYS_MODE_MANUAL || gw.addr[0] != '\0' ||
-           strncmp(name, gw.iface, sizeof gw.iface) == 0;
+static RouteColumn column_of(const char *name, const Gateway &gw) {
+    const bool allowed = gw.mode == VLSYS_MODE_MANUAL || gw.addr[0] != '\0' ||
+                         strncmp(name, gw.iface, sizeof gw.iface) == 0;
+    return allowed ? RouteColumn::allowed : RouteColumn::refused;
 }
 
 static void log_gateway4(const vlsys_gw4 &gw, const char *address) {
@@ -30,18 +57,29 @@ static void log_gateway4(const vlsys_gw4 &gw, const char *address) {
         vlsys_log(LOG_INFO, "IPv4 GW dhcp");
 }
 
-static int set_defroute(const char *name, bool default_route) {
-    if (default_route)
+static int set_route_keys(const char *name, RouteColumn column) {
+    if (column == RouteColumn::allowed)
         vlsys_log(LOG_DEBUG, "%s: delete DEFROUTE", name);
     else
         vlsys_log(LOG_DEBUG, "%s: DEFROUTE=no", name);
-    const edit_item items[] = {
-        {default_route, "DEFROUTE", default_route ? "" : "no"},
-        {1, "METRIC", ""},
-        {1, "GATEWAY", ""},
-        {1, "GATEWAYDEV", ""},
-    };
-    return edit_or_log(SystemPath(ifcfg_prefix, name).text, items);
+    edit_item array[std::size(route_keys)];
+    ItemList list(array);
+    list.add_column(route_keys, column, {});
+    return edit_or_log(SystemPath(ifcfg_prefix, name).text, list.items());
+}
+
+static int set_gateway4(const vlsys_gw4 &gw) {
+    const FieldText address(gw.addr);
+    log_gateway4(gw, address.text);
+    int result = write_gateway("GATEWAY", address.text);
+    if (result != 0)
+        return result;
+    for (const auto &name : InterfaceList()) {
+        result = set_route_keys(name, column_of(name, gw));
+        if (result != 0)
+            return result;
+    }
+    return 0;
 }
 
 static void log_gateway6(const vlsys_gw6 &gw, const char *address) {
@@ -55,65 +93,44 @@ static void log_gateway6(const vlsys_gw6 &gw, const char *address) {
         vlsys_log(LOG_INFO, "IPv6 GW auto");
 }
 
-// The drop-in's line that says whether an interface takes a default route from advertisements.
-static edit_item make_switch(const char *name, bool default_route, SwitchKey *key) {
-    key->set(name, "accept_ra_defrtr");
-    if (default_route) {
+// The switch says whether an interface takes a default route from router advertisements.
+static void set_route_switch(const char *name, RouteColumn column, const char *key,
+                             ItemList *list) {
+    if (column == RouteColumn::allowed) {
         vlsys_log(LOG_INFO, "IPv6 GW auto (%s)", name);
-        vlsys_log(LOG_DEBUG, "%s 1", key->text);
+        vlsys_log(LOG_DEBUG, "%s 1", key);
+        list->set(key, " 1");
     } else {
-        vlsys_log(LOG_DEBUG, "%s 0", key->text);
+        vlsys_log(LOG_DEBUG, "%s 0", key);
+        list->set(key, " 0");
     }
-    return {0, key->text, default_route ? " 1" : " 0"};
 }
 
-static int write_defrtr_switches(const vlsys_gw6 &gw) {
+static int write_route_switches(const vlsys_gw6 &gw) {
     const InterfaceList interfaces;
     vlsys_log(LOG_DEBUG, "vlsys_get_ifname_list: %d", interfaces.count());
     const auto count = static_cast<size_t>(interfaces.count());
     if (count == 0)
         return 0;
     const Owned<SwitchKey[]> keys(static_cast<SwitchKey *>(calloc(count, sizeof(SwitchKey))));
-    const Owned<edit_item[]> items(static_cast<edit_item *>(calloc(count, sizeof(edit_item))));
-    if (!keys || !items) {
-        vlsys_log(LOG_ERR, "calloc(80, %d): %m", interfaces.count());
-        return errno;
-    }
-    size_t i = 0;
+    const Owned<edit_item[]> array(static_cast<edit_item *>(calloc(count, sizeof(edit_item))));
+    if (!keys || !array)
+        return log_errno("calloc(80, %d)", interfaces.count());
+    ItemList list({array.get(), count});
+    SwitchKey *key = keys.get();
     for (const auto &name : interfaces) {
-        items[i] = make_switch(name, has_default_route(gw, name), &keys[i]);
-        i++;
+        *key = switch_key(name, "accept_ra_defrtr");
+        set_route_switch(name, column_of(name, gw), key->text, &list);
+        ++key;
     }
-    return edit_or_log(SystemPath(sysctl_path).text, {items.get(), count});
+    return edit_or_log(SystemPath(sysctl_path).text, list.items());
 }
 
-} // namespace vlsys
-
-using namespace vlsys;
-
-int vlsys_set_ipv4_default_gateway2(const vlsys_gw4 *gw) {
-    if (!gw)
-        return EFAULT;
-    const FieldText address(gw->addr);
-    log_gateway4(*gw, address.text);
-    int result = write_gateway("GATEWAY", address.text);
-    if (result != 0)
-        return result;
-    for (const auto &name : InterfaceList()) {
-        result = set_defroute(name, has_default_route(*gw, name));
-        if (result != 0)
-            return result;
-    }
-    return 0;
-}
-
-int vlsys_set_ipv6_default_gateway2(const vlsys_gw6 *gw) {
-    if (!gw)
-        return EFAULT;
-    const FieldText address(gw->addr);
-    log_gateway6(*gw, address.text);
+static int set_gateway6(const vlsys_gw6 &gw) {
+    const FieldText address(gw.addr);
+    log_gateway6(gw, address.text);
     const int result = write_gateway("IPV6_DEFAULTGW", address.text);
-    return result != 0 ? result : write_defrtr_switches(*gw);
+    return result != 0 ? result : write_route_switches(gw);
 }
 
 // The record that an address text, or none, stands for.
@@ -126,6 +143,18 @@ static Gateway make_gateway(const char *text, uint32_t mode_without) {
         gw.mode = VLSYS_MODE_MANUAL;
     }
     return gw;
+}
+
+} // namespace vlsys
+
+using namespace vlsys;
+
+int vlsys_set_ipv4_default_gateway2(const vlsys_gw4 *gw) {
+    return gw ? -set_gateway4(*gw) : EFAULT;
+}
+
+int vlsys_set_ipv6_default_gateway2(const vlsys_gw6 *gw) {
+    return gw ? -set_gateway6(*gw) : EFAULT;
 }
 
 int vlsys_set_ipv4_default_gateway(const char *text) {

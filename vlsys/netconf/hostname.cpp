@@ -2,7 +2,7 @@
 
 #include "core/log.h"
 #include "core/paths.h"
-#include "netconf/edit.h"
+#include "netconf/keys.h"
 
 #include <cerrno>
 #include <cstdio>
@@ -57,17 +57,23 @@ int check_hostname_format(const char *name) {
     return -1;
 }
 
+static int write_hostname(const char *name) {
+    char hostname[VLSYS_HOSTNAME_SIZE + 1];
+    snprintf(hostname, sizeof hostname, "%.*s", VLSYS_HOSTNAME_SIZE,
+             name && name[0] != '\0' ? name : "localhost");
+    vlsys_log(LOG_INFO, "hostname: %s", hostname);
+    edit_item array[1];
+    ItemList list(array);
+    list.set("HOSTNAME", hostname);
+    return edit_or_log(SystemPath(network_path).text, list.items());
+}
+
 } // namespace vlsys
 
 using namespace vlsys;
 
 int vlsys_set_hostname(const char *name) {
-    char hostname[VLSYS_HOSTNAME_SIZE + 1];
-    snprintf(hostname, sizeof hostname, "%.*s", VLSYS_HOSTNAME_SIZE,
-             name && name[0] != '\0' ? name : "localhost");
-    const edit_item items[] = {{0, "HOSTNAME", hostname}};
-    vlsys_log(LOG_INFO, "hostname: %s", hostname);
-    return edit_or_log(SystemPath(network_path).text, items);
+    return -write_hostname(name);
 }
 
 int vlsys_get_hostname(char *name) {
@@ -78,12 +84,11 @@ int vlsys_get_hostname(char *name) {
 
 int vlsys_set_hostname_immediately(const char *name) {
     static constexpr char self[] = "vlsys_set_hostname_immediately";
-    static constexpr int refused = 420;
     static constexpr size_t longest = 64; // that the kernel takes
     if (check_hostname_format(name) != 0 || strlen(name) > longest) {
         errno = EINVAL;
-        vlsys_log(LOG_ERR, "%s: hostname(%s) is not correct format: %m", self, name);
-        return refused;
+        log_errno("%s: hostname(%s) is not correct format", self, name);
+        return VLSYS_HOSTNAME_REFUSED;
     }
     char current[VLSYS_HOSTNAME_SIZE];
     int result = vlsys_get_hostname(current);
@@ -95,16 +100,13 @@ int vlsys_set_hostname_immediately(const char *name) {
         vlsys_log(LOG_INFO, "%s: do not set up for the same hostname: %s", self, name);
         return 0;
     }
-    result = vlsys_set_hostname(name);
+    result = write_hostname(name);
     if (result != 0) {
-        errno = result;
-        vlsys_log(LOG_ERR, "%s: vlsys_set_hostname(%s): %m", self, name);
-        return result;
+        errno = -result;
+        return -log_errno("%s: vlsys_set_hostname(%s)", self, name);
     }
     const size_t length = strlen(name);
-    if (sethostname(name, length) != 0) {
-        vlsys_log(LOG_ERR, "%s: sethostname(%s, %zd): %m", self, name, length);
-        return errno;
-    }
+    if (sethostname(name, length) != 0)
+        return -log_errno("%s: sethostname(%s, %zd)", self, name, length);
     return 0;
 }

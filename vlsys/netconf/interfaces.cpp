@@ -6,6 +6,7 @@
 #include <cstring>
 #include <net/if.h>
 #include <span>
+#include <sys/socket.h>
 
 namespace vlsys {
 
@@ -16,15 +17,35 @@ struct FreeIndex {
 };
 using Index = std::unique_ptr<struct if_nameindex, FreeIndex>;
 
+// An array's element, where a plain InterfaceName can't be assigned.
+struct Name {
+    InterfaceName text;
+};
+
 } // namespace
+
+// The C library asks the kernel by way of a socket, and when it gets none says ENOENT, whatever the
+// reason. A socket of our own tells it.
+static void find_reason() {
+    if (errno == ENOENT)
+        const Fd tried(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+}
 
 int find_interface(const char *name) {
     const unsigned int index = if_nametoindex(name);
-    if (index == 0)
-        return errno == ENODEV ? -ENXIO : log_errno("if_nametoindex(%s)", name);
+    if (index == 0) {
+        if (errno == ENODEV)
+            return -ENXIO;
+        find_reason();
+        return log_errno("if_nametoindex(%s)", name);
+    }
     char own_name[IF_NAMESIZE];
-    if (!if_indextoname(index, own_name))
-        return errno == ENXIO ? -ENXIO : log_errno("if_indextoname(%u)", index);
+    if (!if_indextoname(index, own_name)) {
+        if (errno == ENXIO)
+            return -ENXIO;
+        find_reason();
+        return log_errno("if_indextoname(%u)", index);
+    }
     return strcmp(name, own_name) == 0 ? 0 : -ENXIO;
 }
 
@@ -59,11 +80,6 @@ int compare_ifname(const void *a, const void *b) {
     return compare_natural(static_cast<const char *>(a), static_cast<const char *>(b),
                            VLSYS_IFNAME_SIZE);
 }
-
-// An array's element, where a plain InterfaceName can't be assigned.
-struct Name {
-    InterfaceName text;
-};
 
 static bool is_below(const Name &a, const Name &b) {
     return compare_ifname(a.text, b.text) < 0;
@@ -115,7 +131,7 @@ using namespace vlsys;
 int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]) {
     const Index index(if_nameindex());
     if (!index) {
-        vlsys_log(LOG_ERR, "%s: %m", "if_nameindex");
+        log_errno("%s", "if_nameindex");
         return 0;
     }
     int count = 0;
@@ -126,7 +142,7 @@ int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]) {
     auto *const names = static_cast<Name *>(calloc(static_cast<size_t>(count), sizeof(Name)));
     *pifn = reinterpret_cast<InterfaceName *>(names);
     if (!names) {
-        vlsys_log(LOG_ERR, "*pifn = calloc(%d, %d): %m", VLSYS_IFNAME_SIZE, count);
+        log_errno("*pifn = calloc(%d, %d)", VLSYS_IFNAME_SIZE, count);
         return 0;
     }
     Name *next = names;

@@ -1,24 +1,33 @@
 #include "netconf/keys.h"
 
+#include "vlsys.h"
+
+#include <algorithm>
 #include <cstdio>
+#include <iterator>
 
 namespace vlsys {
 
-static const char *text_of(Cell cell, const Fields &fields) {
-    static constexpr const char *fixed[] = {nullptr, nullptr, "no", "yes",
-                                            "none",  "dhcp",  " 0", " 1"};
-    return cell < field_1 ? fixed[cell] : fields.text[cell - field_1];
+void ItemList::add(const edit_item &item) {
+    if (count_ < array_.size())
+        array_[count_] = item;
+    count_++;
 }
 
-void ItemList::add(const char *key, Cell cell, const Fields &fields) {
-    if (cell == kept)
-        return;
-    const char *const text = text_of(cell, fields);
-    items_[count_++] = {!text, key, text ? text : ""};
+std::span<const edit_item> ItemList::items() const {
+    if (count_ > array_.size())
+        return {};
+    return array_.first(count_);
 }
 
-void SwitchKey::set(const char *interface, const char *name) {
-    snprintf(text, sizeof text, "net.ipv6.conf.%s.%s ", interface, name);
+// sysctl parts a name at its dots, so a dot in the interface's own name is written "/".
+SwitchKey switch_key(const char *interface, const char *name) {
+    char own_name[VLSYS_IFNAME_SIZE] = {};
+    vlsys_strlcpy(own_name, interface, sizeof own_name);
+    std::replace(std::begin(own_name), std::end(own_name), '.', '/');
+    SwitchKey key;
+    snprintf(key.text, sizeof key.text, "net.ipv6.conf.%s.%s ", own_name, name);
+    return key;
 }
 
 } // namespace vlsys
