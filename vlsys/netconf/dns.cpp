@@ -114,16 +114,18 @@ static int set_dns(const vlsys_dns &dns) {
     return 0;
 }
 
-static void read_resolver(FILE *file, vlsys_dns *dns) {
+// Returns 0, or the negated errno when the file cannot be read.
+static int read_resolver(FILE *file, vlsys_dns *dns) {
     int servers = 0;
     char line[256];
-    while (read_line(file, line, sizeof line) > 0) {
+    int result = 0;
+    while ((result = read_line(file, line, sizeof line)) > 0) {
         if (line[0] == '#' || line[0] == ';' || line[0] == '\n')
             continue;
         char *rest = nullptr;
         const char *const word = strtok_r(line, " \t\n", &rest);
         if (!word)
-            return;
+            return 0;
         const std::string_view keyword = word;
         const char *value = strtok_r(nullptr, " \t\n", &rest);
         if (!value)
@@ -133,20 +135,32 @@ static void read_resolver(FILE *file, vlsys_dns *dns) {
         else if (starts_with(keyword, "nameserver") && servers < VLSYS_DNS_COUNT)
             vlsys_strlcpy(dns->server[servers++], value, VLSYS_ADDR6_SIZE);
     }
+    return result;
 }
 
-static int read_dns_of(const char *name, DnsSettings *settings) {
-    const File file = open_ifcfg("vlsys_get_dns_settings", name);
-    if (!file)
-        return errno;
+// Returns 0, or the negated errno when the file cannot be read.
+static int read_peerdns(FILE *file, DnsSettings *settings) {
     *settings = {};
     char line[256];
     Setting setting;
-    while (next_setting(file.get(), line, sizeof line, Quotes::keep, &setting) > 0) {
+    int result = 0;
+    while ((result = next_setting(file, line, sizeof line, Quotes::keep, &setting)) > 0) {
         settings->peerdns_no |=
             strcmp(setting.key, "PEERDNS") == 0 && strcmp(setting.value, "no") == 0;
         settings->has_domain |= strcmp(setting.key, "DOMAIN") == 0;
     }
+    return result;
+}
+
+static int read_dns_of(const char *name, DnsSettings *settings) {
+    static constexpr char self[] = "vlsys_get_dns_settings";
+    Ifcfg ifcfg;
+    int result = open_ifcfg(self, name, &ifcfg);
+    if (result != 0)
+        return result;
+    result = read_peerdns(ifcfg.file.get(), settings);
+    if (result != 0 && result != -EISDIR) // a directory reads as empty
+        return log_errno("%s: fgets(%s)", self, ifcfg.path.get());
     return 0;
 }
 
@@ -173,6 +187,20 @@ static int read_dns_mode(const InterfaceList &interfaces, uint32_t *mode) {
     return result;
 }
 
+static int get_dns(vlsys_dns *dns) {
+    *dns = {};
+    const File file(fopen(resolv_path, "re"));
+    if (!file)
+        return errno == ENOENT ? 0 : log_errno("%s", resolv_path);
+    const int result = read_resolver(file.get(), dns);
+    if (result != 0 && result != -EISDIR) { // a directory reads as empty
+        *dns = {};
+        return log_errno("fgets(%s)", resolv_path);
+    }
+    const InterfaceList interfaces;
+    return interfaces.count() == 0 ? 0 : read_dns_mode(interfaces, &dns->mode);
+}
+
 } // namespace vlsys
 
 using namespace vlsys;
@@ -182,15 +210,5 @@ int vlsys_set_dns_settings(const vlsys_dns *dns) {
 }
 
 int vlsys_get_dns_settings(vlsys_dns *dns) {
-    *dns = {};
-    const File file(fopen(resolv_path, "re"));
-    if (!file) {
-        if (errno == ENOENT)
-            return 0;
-        vlsys_log(LOG_ERR, "%s: %m", resolv_path);
-        return errno;
-    }
-    read_resolver(file.get(), dns);
-    const InterfaceList interfaces;
-    return interfaces.count() == 0 ? 0 : read_dns_mode(interfaces, &dns->mode);
+    return -get_dns(dns);
 }

@@ -6,16 +6,14 @@
 
 namespace vlsys {
 
-File open_ifcfg(const char *operation, const char *interface) {
-    const Text path = format_text("%s%s", ifcfg_prefix, interface);
-    if (!path) {
-        vlsys_log(LOG_ERR, "asprintf(\"%s%s\"): %m", ifcfg_prefix, interface);
-        return nullptr;
-    }
-    File file(fopen(path.get(), "re"));
-    if (!file)
-        vlsys_log(LOG_ERR, "%s: fopen(%s): %m", operation, path.get());
-    return file;
+int open_ifcfg(const char *operation, const char *interface, Ifcfg *ifcfg) {
+    ifcfg->path = format_text("%s%s", ifcfg_prefix, interface);
+    if (!ifcfg->path)
+        return log_errno("asprintf(\"%s%s\")", ifcfg_prefix, interface);
+    ifcfg->file.reset(fopen(ifcfg->path.get(), "re"));
+    if (!ifcfg->file)
+        return log_errno("%s: fopen(%s)", operation, ifcfg->path.get());
+    return 0;
 }
 
 } // namespace vlsys

@@ -5,8 +5,13 @@
 
 namespace vlsys {
 
-// Opens an interface's file for reading. Null, with errno set, after a message that names the
-// operation.
-File open_ifcfg(const char *operation, const char *interface);
+// An interface's file, open for reading.
+struct Ifcfg {
+    Text path;
+    File file;
+};
+
+// Returns 0, or the negated errno after a message that names the operation.
+int open_ifcfg(const char *operation, const char *interface, Ifcfg *ifcfg);
 
 } // namespace vlsys
