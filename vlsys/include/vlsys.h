@@ -212,6 +212,18 @@ VLSYS_API size_t vlsys_get_utc_offset(char *buffer, size_t size);
 
 /* ---- Network records ------------------------------------------------------------------------- */
 
+/*
+ * The setters of the next sections write the texts of these records into files that scripts source
+ * as root, unchecked and without quotes: "$(reboot)" in a field that is written will be run. Let a
+ * validator check a setting first, and leave empty the fields that it does not look at (see
+ * "Validation of a network setting").
+ *
+ * A setter changes the first line of a key. Where a key stands in a file more than once, the later
+ * lines stay, and in a shell the last one wins. Of two setters at once on one file, the later
+ * rename wins: what the other one wrote is lost. /etc/sysctl.d/velmora has no ".conf" in its name:
+ * scripts that take every file of the directory read it, others do not.
+ */
+
 /* How an interface, a default gateway or DNS is set. */
 #define VLSYS_MODE_OFF 0
 #define VLSYS_MODE_MANUAL 1 /* fixed values of the record */
@@ -234,7 +246,10 @@ typedef struct vlsys_ifconf {
     uint8_t up;                           /* 1 when the interface has an IPv4 address and is up */
     char addr[VLSYS_ADDR4_SIZE];          /* IPv4 address */
     char broadaddr[VLSYS_ADDR4_SIZE];     /* IPv4 broadcast address */
-    char netmask[VLSYS_ADDR4_SIZE];       /* IPv4 netmask, dotted decimal */
+    char netmask[VLSYS_ADDR4_SIZE];       /* IPv4 netmask, dotted decimal. The validators take the
+                                             number that it begins with for a prefix length, 8 to 30:
+                                             "24abc" and "24.0.0.0" are 24. "31" is 0.0.0.31, a mask
+                                             with a gap. */
     uint8_t prefix;                       /* IPv4 prefix length, 0 to 32 */
     uint32_t ipv4_mode;                   /* VLSYS_MODE_OFF, _MANUAL, any other value DHCP */
     uint8_t has_ipv6;                     /* 1 when the interface has an IPv6 address */
@@ -280,9 +295,13 @@ VLSYS_API int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]);
 /*
  * Sets how the interface gets its addresses: the keys of
  * <root>/etc/sysconfig/network-scripts/ifcfg-<name>, then the interface's IPv6 switches (lines
- * "net.ipv6.conf.<name>.<switch> = <0 or 1>") in <root>/etc/sysctl.d/velmora. Of the record it
- * takes ipv4_mode, with addr and netmask in Manual mode (prefix is only logged), and ipv6_mode,
- * with addr and prefix of addr6[0] in Manual mode. Nothing is checked.
+ * "net.ipv6.conf.<name>.<switch> = <0 or 1>", a dot in the name written "/") in
+ * <root>/etc/sysctl.d/velmora. Of the record it takes ipv4_mode, with addr and netmask in Manual
+ * mode (prefix is only logged), and ipv6_mode, with addr and prefix of addr6[0] in Manual mode.
+ * Nothing is checked: scripts source the file as root, whatever the texts hold.
+ *
+ * An interface's file that this or another setter makes anew has no DEVICE: the network scripts do
+ * not bring the interface up by it.
  *
  * Keys of the interface's file ("-": removed). GATEWAY, PREFIX, UUID, HWADDR, IPV6FORWARDING and
  * IPV6_ROUTER are always removed, NM_CONTROLLED is always "no".
@@ -293,18 +312,21 @@ VLSYS_API int vlsys_get_ifname_list(char (**pifn)[VLSYS_IFNAME_SIZE]);
  *   IPADDR         as it was      -     addr         -
  *   NETMASK        as it was      -     netmask      -
  *
- *   IPv6           Off            DHCP  Manual       Auto
- *   IPV6INIT       no             yes   yes          yes
- *   IPV6_AUTOCONF  no             yes   no           yes
- *   IPV6ADDR       -              -     addr/prefix  -
- *   DHCPV6C        -              yes   -            -
+ *   IPv6             Off        Manual       DHCP  Auto
+ *   IPV6INIT         no         yes          yes   yes
+ *   IPV6_AUTOCONF    no         no           yes   yes
+ *   IPV6ADDR         -          addr/prefix  -     -
+ *   DHCPV6C          -          -            yes   -
  *
- * Switches: Off disable_ipv6 1, the others as they were; Manual disable_ipv6, autoconf and
- * accept_ra_pinfo 0; DHCP and Auto disable_ipv6 0, autoconf and accept_ra_pinfo 1.
+ *   Switches         Off        Manual       DHCP  Auto
+ *   disable_ipv6     1          0            0     0
+ *   autoconf         as it was  0            1     1
+ *   accept_ra_pinfo  as it was  0            1     1
  *
  * Returns 0; 14 (EFAULT) for a null name or record and 6 (ENXIO) for an interface that the kernel
- * does not know, both silent and with no file touched; else the positive errno of the failed
- * rewrite, the second file untouched when the first one failed.
+ * does not have under that very name, both silent and with no file touched; the positive errno of
+ * the kernel's answer when it cannot be asked, such as EMFILE (no file touched); else that of the
+ * failed rewrite, the second file untouched when the first one failed.
  * Logs at LOG_INFO "IPv4 (<name>): " and "IPv6 (<name>): ", each with "OFF", the address and prefix
  * length, "DHCP" or "AUTO". Waits for each file to reach the disk.
  */
@@ -318,11 +340,15 @@ VLSYS_API int vlsys_set_netif(const char *name, const vlsys_ifconf *conf);
  * interface named in `iface` gets PEERDNS=yes in DHCP mode, and in Manual mode also `domain` (even
  * when empty), server[0] and, when not empty, server[1]; in Off mode it gets PEERDNS=no, as every
  * other interface does in any mode. Keys without a value here are removed. An `iface` that names
- * none of the unit's interfaces is no failure.
+ * none of the unit's interfaces is no failure; it is only compared. Nothing is checked: scripts
+ * source the file as root, whatever the texts hold.
+ *
+ * In Manual mode on an interface with DHCP the servers of the lease stay in force, behind these.
  *
  * Returns 0; 14 (EFAULT) for a null record; 22 (EINVAL) when the mode is not Off and `iface` is
  * empty (no file touched), or when it is Manual for one of the unit's interfaces and server[0] is
- * empty; 6 (ENXIO) when the unit has no interface; all these are silent. Else the positive errno of
+ * empty; 6 (ENXIO) when the unit has no interface; all these are silent, but for a list of
+ * interfaces that cannot be had, which counts as none and is logged. Else the positive errno of
  * a failed rewrite, with "param: failed" logged. A failure leaves the files of earlier interfaces
  * rewritten. Logs the setting of the DNS interface at LOG_INFO, each path and every other interface
  * at LOG_DEBUG. Waits for each file to reach the disk.
@@ -336,8 +362,8 @@ VLSYS_API int vlsys_set_dns_settings(const vlsys_dns *dns);
  * one has DOMAIN, else Off when all have PEERDNS=no, else DHCP. `iface` is left empty. Without
  * /etc/resolv.conf the whole record is zero (Off), without an interface the mode is Off.
  *
- * Returns 0, or the positive errno of a file that cannot be read: of /etc/resolv.conf with the
- * record zero, of an interface's file with what was read before it.
+ * Returns 0, or the positive errno of a file that cannot be opened or read: of /etc/resolv.conf
+ * with the record zero, of an interface's file with what was read before it.
  */
 VLSYS_API int vlsys_get_dns_settings(vlsys_dns *dns);
 
@@ -348,7 +374,11 @@ VLSYS_API int vlsys_get_dns_settings(vlsys_dns *dns);
  * mode, or removed when that is empty. Then, in <root>/etc/sysconfig/network-scripts/ifcfg-<name>
  * of every interface, in natural order, METRIC, GATEWAY and GATEWAYDEV are removed, and DEFROUTE is
  * removed when the interface may have a default route of its own, else "no". Every interface may
- * when `addr` is not empty or the mode is Manual; otherwise only the one named in `iface`.
+ * when `addr` is not empty or the mode is Manual; otherwise only the one named in `iface`. Nothing
+ * is checked: scripts source the files as root, whatever `addr` holds.
+ *
+ * A fixed gateway comes into force on an interface whose subnet holds it. Outside the subnet that a
+ * lease gives there is none.
  *
  * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed rewrite,
  * with earlier files rewritten. When the list of interfaces cannot be had (logged) that counts as
@@ -369,7 +399,11 @@ VLSYS_API int vlsys_set_ipv4_default_gateway(const char *text);
  * the mode, or removed when that is empty. Then the lines
  * "net.ipv6.conf.<name>.accept_ra_defrtr = <0 or 1>" of all interfaces are set in
  * <root>/etc/sysctl.d/velmora, in one rewrite: 1 for an interface that may take a default route
- * from router advertisements, by the rule of vlsys_set_ipv4_default_gateway2.
+ * from router advertisements, by the rule of vlsys_set_ipv4_default_gateway2; a dot in the name is
+ * written "/". Nothing is checked: scripts source the first file as root, whatever `addr` holds.
+ *
+ * On an interface that learns its prefix, prefer a fixed gateway of the form "fe80::1%eth0": the
+ * scripts install the gateway before the prefix is there, and then no other can be reached.
  *
  * Returns 0; 14 (EFAULT) for a null record (silent); else the positive errno of the failed step:
  * the first file's rewrite (the second is then untouched), memory, or the second file's rewrite.
@@ -389,8 +423,10 @@ VLSYS_API int vlsys_set_ipv6_default_gateway(const char *text);
 /* ---- Host name ------------------------------------------------------------------------------- */
 
 /*
- * Sets HOSTNAME of <root>/etc/sysconfig/network: the name, cut to 1025 characters and otherwise
- * unchecked, or "localhost" when it is null or empty. The running host name stays as it is.
+ * Sets HOSTNAME of <root>/etc/sysconfig/network: the name, cut to 1025 characters, or "localhost"
+ * when it is null or empty. The running host name stays as it is. Nothing else is checked: scripts
+ * source the file as root, whatever the name holds. "localhost" gives way to the host name of a
+ * DHCP lease.
  *
  * Returns 0, or the positive errno of the failed rewrite.
  * Logs "hostname: <name>" at LOG_INFO. Waits for the file to reach the disk.
@@ -409,9 +445,11 @@ VLSYS_API int vlsys_get_hostname(char *name);
  * digits and single hyphens, which neither begin nor end a label, joined by dots; one dot may end
  * it. The empty name is not refused: the file then has "localhost".
  *
- * Returns 0, also when the name is the running host name already (nothing is written; logged at
- * LOG_INFO); 420 for a name that breaks these rules; else the positive errno of the failed step:
- * when the kernel refuses the name, the file has it already. Waits for the file to reach the disk.
+ * Returns 0, also when the name is the running host name already (nothing is written, so a name
+ * that vlsys_set_hostname wrote before stays in the file; logged at LOG_INFO);
+ * VLSYS_HOSTNAME_REFUSED for a name that breaks these rules; else the positive errno of the failed
+ * step: when the kernel refuses the name, the file has it already. Waits for the file to reach the
+ * disk.
  */
 #define VLSYS_HOSTNAME_REFUSED 420
 VLSYS_API int vlsys_set_hostname_immediately(const char *name);
