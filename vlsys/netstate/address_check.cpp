@@ -3,7 +3,7 @@
 #include "core/log.h"
 #include "core/text.h"
 #include "netstate/address.h"
-#include "netstate/modes.h"
+#include "netstate/mode_text.h"
 #include "netstate/rules.h"
 
 #include <cerrno>

@@ -5,7 +5,7 @@
 #include "core/owners.h"
 #include "core/text.h"
 #include "netstate/address.h"
-#include "netstate/modes.h"
+#include "netstate/mode_text.h"
 #include "netstate/rules.h"
 
 #include <cerrno>

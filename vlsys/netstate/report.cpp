@@ -2,7 +2,7 @@
 
 #include "core/log.h"
 #include "netconf/interfaces.h"
-#include "netstate/modes.h"
+#include "netstate/mode_text.h"
 
 #include <algorithm>
 #include <cstdarg>

@@ -1,4 +1,4 @@
-#include "netstate/modes.h"
+#include "netstate/mode_text.h"
 
 #include "netstate/address.h"
 
