@@ -31,22 +31,26 @@ static void find_reason() {
         const Fd tried(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
 }
 
-int find_interface(const char *name) {
-    const unsigned int index = if_nametoindex(name);
-    if (index == 0) {
+int find_interface(const char *name, unsigned int *index) {
+    const unsigned int found = if_nametoindex(name);
+    if (found == 0) {
         if (errno == ENODEV)
             return -ENXIO;
         find_reason();
         return log_errno("if_nametoindex(%s)", name);
     }
     char own_name[IF_NAMESIZE];
-    if (!if_indextoname(index, own_name)) {
+    if (!if_indextoname(found, own_name)) {
         if (errno == ENXIO)
             return -ENXIO;
         find_reason();
-        return log_errno("if_indextoname(%u)", index);
+        return log_errno("if_indextoname(%u)", found);
     }
-    return strcmp(name, own_name) == 0 ? 0 : -ENXIO;
+    if (strcmp(name, own_name) != 0)
+        return -ENXIO;
+    if (index)
+        *index = found;
+    return 0;
 }
 
 bool is_virtual_bridge(const char *name) {

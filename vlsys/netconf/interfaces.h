@@ -23,8 +23,9 @@ class InterfaceList {
 
 // Whether the kernel has an interface of that very name. It also finds one by an alternative name,
 // and looks at a name up to its colon only ("eth0:/../../x"): neither counts.
-// Returns 0; -ENXIO when there is none (silent); else the negated errno of the look-up, logged.
-int find_interface(const char *name);
+// Returns 0, and its index through `index` unless that is null; -ENXIO when there is none (silent);
+// else the negated errno of the look-up, logged.
+int find_interface(const char *name, unsigned int *index = nullptr);
 
 // Whether the name is one of the virtual bridges, virbr*.
 bool is_virtual_bridge(const char *name);
