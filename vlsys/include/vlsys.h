@@ -470,10 +470,11 @@ VLSYS_API int vlsys_set_hostname_immediately(const char *name);
  * - up, has_ipv6 and addr6 are cleared first; the other fields of what the interface does not have
  *   stay as they are, so give a record of zeros.
  *
- * Returns 0; 14 (EFAULT) for a null argument and 6 (ENXIO) when there is no such interface, both
- * silent and with nothing written; the errno value of getifaddrs; the errno value or negative
- * resolver code of an address that could not be converted, with the fields up to it filled, but not
- * name, index and the modes; the positive errno of an interface file that cannot be read, with all
+ * Returns 0; 14 (EFAULT) for a null argument and 6 (ENXIO) when no interface has that very name (an
+ * alternative name is none), both silent and with nothing written; the errno value of a look-up
+ * that failed otherwise, such as 24 (EMFILE) without a free descriptor, with nothing written; the
+ * errno value of getifaddrs; the errno value or negative resolver code of an address that could not
+ * be converted, with the fields up to it filled, but not name, index and the modes; the positive errno of an interface file that cannot be read, with all
  * filled but ipv4_mode. An interface that vanishes meanwhile leaves name and index unwritten.
  * Reads the kernel's list once; waits 11 seconds for a switch file that is missing.
  */
@@ -851,7 +852,7 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * that is full may lack its NUL; gw4 is a buffer of VLSYS_ADDR4_SIZE, gw6 one of VLSYS_ADDR6_SIZE
  * bytes, both empty for no gateway, and hostname a text in one of at least 64.
  *
- * - The interface exists.
+ * - The kernel has an interface of that very name; an alternative name is none.
  * - IPv4 Manual: addr, netmask (a prefix length of 8 to 30 becomes a mask) and the gateway become
  *   canonical, broadaddr is filled. The gateway lies in the subnet; neither it nor addr is the
  *   network or broadcast address, which a netmask of 255.255.255.255 does not have. IPv4 DHCP: the
@@ -871,8 +872,10 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * - The host name is well-formed and at most 64 characters long; an empty one becomes "localhost",
  *   with a warning.
  *
- * Returns 0, a check code at position 0, EFAULT for a null argument, or the errno value or negative
- * resolver code of a failed address conversion; that of broadaddr alone does not stop the checks.
+ * Returns 0, a check code at position 0, EFAULT for a null argument, the errno value of a look-up of
+ * the interface that failed for a reason of its own (EMFILE without a free descriptor), or the
+ * errno value or negative resolver code of a failed address conversion; that of broadaddr alone
+ * does not stop the checks.
  * Logs the modes at LOG_INFO at the start and when all is well, and each fault at LOG_ERR. Silent:
  * null arguments, an interface that does not exist, an IPv6 prefix length above 128, an address of
  * a range that its field does not allow, a link-local address without scope, a name with a
@@ -887,7 +890,7 @@ VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys
  * Checks the network setting of `count` interfaces at once, in the manner of vlsys_address_check;
  * what differs:
  *
- * - Interfaces: "eth1" need not exist, and "lo" is refused. A prefix of 8 to 30 replaces the
+ * - Interfaces: "eth1" need not exist, nor is it looked up, and "lo" is refused. A prefix of 8 to 30 replaces the
  *   netmask; otherwise it becomes the netmask's length, which must be 8 to 30.
  * - No two interfaces have the same IPv4 address, and none has a Manual address in the subnet of
  *   another one, in either family (in IPv6 silent).

@@ -2,12 +2,12 @@
 // subnet, a server there or behind a gateway, and a DNS mode that cannot work is turned off.
 #include "core/log.h"
 #include "core/text.h"
+#include "netconf/interfaces.h"
 #include "netstate/address.h"
 #include "netstate/mode_text.h"
 #include "netstate/rules.h"
 
 #include <cerrno>
-#include <net/if.h>
 
 namespace vlsys {
 
@@ -142,8 +142,11 @@ int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,
         return EFAULT;
     vlsys_log(LOG_INFO, "%s: start (%s, %s, %s)", "vlsys_address_check", mode_name(nif->ipv4_mode),
               mode_name(dns->mode), mode_name(nif->ipv6_mode));
-    if (if_nametoindex(FieldText(nif->name).text) == 0)
+    const int missing = find_interface(FieldText(nif->name).text);
+    if (missing == -ENXIO)
         return field_code(VLSYS_CHECK_FIELD_IFNAME) | VLSYS_CHECK_KIND_NO_IFACE;
+    if (missing != 0)
+        return -missing;
 
     Reach reach = {*nif, gw4, gw6, {}, {}};
     int conversion = 0;

@@ -4,12 +4,12 @@
 #include "core/log.h"
 #include "core/owners.h"
 #include "core/text.h"
+#include "netconf/interfaces.h"
 #include "netstate/address.h"
 #include "netstate/mode_text.h"
 #include "netstate/rules.h"
 
 #include <cerrno>
-#include <net/if.h>
 #include <span>
 
 namespace vlsys {
@@ -32,11 +32,12 @@ struct Network {
 
 static int check_name(const vlsys_ifconf &nif, int position) {
     const FieldText name(nif.name);
-    // The second port may be set before it is there.
+    // The second port may be set before it is there, so it is not looked up.
     if (strcmp(name.text, "eth1") == 0)
         return 0;
-    if (strcmp(name.text, "lo") != 0 && if_nametoindex(name.text) != 0)
-        return 0;
+    const int missing = strcmp(name.text, "lo") == 0 ? -ENXIO : find_interface(name.text);
+    if (missing != -ENXIO)
+        return -missing;
     vlsys_log(LOG_DEBUG, "nif->name: %s", name.text);
     return field_code(VLSYS_CHECK_FIELD_IFNAME, position) | VLSYS_CHECK_KIND_NO_IFACE;
 }

@@ -1,5 +1,6 @@
 #include "core/log.h"
 #include "netconf/get_mode.h"
+#include "netconf/interfaces.h"
 #include "netstate/address.h"
 
 #include <bit>
@@ -132,9 +133,10 @@ using namespace vlsys;
 int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif) {
     if (!nif || !ifname)
         return EFAULT;
-    const unsigned int index = if_nametoindex(ifname);
-    if (index == 0)
-        return ENXIO;
+    unsigned int index = 0;
+    const int missing = find_interface(ifname, &index);
+    if (missing != 0)
+        return -missing;
     ifaddrs *list = nullptr;
     if (getifaddrs(&list) != 0) {
         vlsys_log(LOG_ERR, "%s: %m", "getifaddrs");
