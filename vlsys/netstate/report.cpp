@@ -1,6 +1,7 @@
 #include "netstate/report.h"
 
 #include "core/log.h"
+#include "core/wait.h"
 #include "netconf/interfaces.h"
 #include "netstate/mode_text.h"
 
@@ -9,7 +10,6 @@
 #include <cstring>
 #include <netdb.h>
 #include <span>
-#include <unistd.h>
 
 namespace vlsys {
 
@@ -56,7 +56,7 @@ static void query(const char *name, int exit_code, vlsys_ifconf &nif) {
         }
         if (exit_code != 0 || nif.ipv6_mode == VLSYS_MODE_OFF || nif.has_ipv6)
             return;
-        sleep(1);
+        wait_seconds(1);
         vlsys_log(LOG_DEBUG, "%s: retry vlsys_get_netif(%s) %d times", "print_network_info", name,
                   tries);
     }
