@@ -488,8 +488,9 @@ VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
  * Without such a route the record is all empty (Off).
  *
  * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the
- * table when it cannot be opened, with the record as it was; the errno value or negative resolver
- * code of an address that could not be converted, with the record Off.
+ * table when it cannot be opened, with the record as it was, or when it cannot be read, with the
+ * record Off; the errno value or negative resolver code of an address that could not be converted,
+ * with the record Off.
  */
 VLSYS_API int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw);
 
@@ -500,9 +501,10 @@ VLSYS_API int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw);
  * begins with "GATEWAY="; else DHCP when <root>/etc/sysconfig/network-scripts/ifcfg-<name> of some
  * interface has a line that begins with "BOOTPROTO=dhcp" and none with "DEFROUTE=no"; else Off.
  *
- * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of a
- * file that cannot be opened: of the table with the record as it was, of another with the gateway
- * read, and the mode as far as it was found; the errno value or negative resolver code of an
+ * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the
+ * table when it cannot be opened, with the record as it was; the errno value of another file that
+ * cannot be opened or read, with the gateway read, and the mode as far as it was found; the errno
+ * value of the table when it cannot be read, or the errno value or negative resolver code of an
  * address that could not be converted, with `addr` and `iface` empty and the mode found.
  */
 VLSYS_API int vlsys_get_ipv4_default_gateway2(vlsys_gw4 *gw);
@@ -518,14 +520,15 @@ VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
 
 /*
  * Puts into force what the setters wrote, and logs the state that comes of it. In this order: sets
- * the running host name to the HOSTNAME of /etc/sysconfig/network (empty when there is none, or no
- * file); makes sure that vlsys_get_dns_settings can read; removes /etc/resolv.conf, which the
+ * the running host name to the HOSTNAME of /etc/sysconfig/network (empty when there is none, or when
+ * the file cannot be opened, which is logged); makes sure that vlsys_get_dns_settings can read; removes /etc/resolv.conf, which the
  * network scripts write anew; runs "service network restart" with vlsys_system; reports.
  *
  * Returns
  *   the exit code of the restart command, 0 to 255, or 256 when it did not exit normally;
  *   a positive errno when the DNS settings cannot be read, with only the host name set;
- *   the negated errno when the host name cannot be set, with nothing else done;
+ *   the negated errno when that file opens and cannot be read, with nothing done, or when the host
+ *   name cannot be set, with nothing else done;
  *   a negative result of vlsys_system when the restart command could not be run, with no report.
  * A negated errno of 1 (EPERM) is also -1; a positive errno is told from an exit code by the log.
  * Failures in the report are logged and change nothing; nor does /etc/resolv.conf that cannot be

@@ -12,34 +12,40 @@ namespace vlsys {
 
 static constexpr char restart_command[] = "service network restart";
 
-// The HOSTNAME of the network file; empty when there is none. The file is the one that the system's
-// own scripts read, whatever the root path is.
-static void get_sysconfig_hostname(char (&hostname)[VLSYS_HOSTNAME_SIZE]) {
+// The HOSTNAME of the network file, in a buffer of VLSYS_HOSTNAME_SIZE bytes; empty when there is
+// none, or no file that can be opened. The file is the one that the system's own scripts read,
+// whatever the root path is.
+// Returns 0, or the negated errno of an open file that cannot be read: it may well have a name.
+static int get_sysconfig_hostname(char *hostname) {
+    static constexpr char self[] = "get_sysconfig_hostname";
     hostname[0] = '\0';
     const File file(fopen(network_path, "re"));
     if (!file) {
-        vlsys_log(LOG_ERR, "%s: fopen(%s): %m", "get_sysconfig_hostname", network_path);
-        return;
+        log_errno("%s: fopen(%s)", self, network_path);
+        return 0;
     }
     char line[VLSYS_HOSTNAME_SIZE + sizeof "HOSTNAME=\n" - 1];
     Setting setting;
-    while (next_setting(file.get(), line, sizeof line, Quotes::remove, &setting) > 0) {
+    int result = 0;
+    while ((result = next_setting(file.get(), line, sizeof line, Quotes::remove, &setting)) > 0) {
         if (strcmp(setting.key, "HOSTNAME") == 0) {
-            vlsys_strlcpy(hostname, setting.value, sizeof hostname);
-            return;
+            vlsys_strlcpy(hostname, setting.value, VLSYS_HOSTNAME_SIZE);
+            return 0;
         }
     }
+    return result < 0 ? log_errno("%s: fgets(%s)", self, network_path) : 0;
 }
 
 static int set_running_hostname() {
     char hostname[VLSYS_HOSTNAME_SIZE];
-    get_sysconfig_hostname(hostname);
+    const int result = get_sysconfig_hostname(hostname);
+    if (result != 0)
+        return result;
     const size_t length = strlen(hostname);
-    if (sethostname(hostname, length) == 0)
-        return 0;
-    vlsys_log(LOG_ERR, "%s: sethostname(%s, %d): %m", "vlsys_network_restart", hostname,
-              static_cast<int>(length));
-    return -errno;
+    if (sethostname(hostname, length) != 0)
+        return log_errno("%s: sethostname(%s, %d)", "vlsys_network_restart", hostname,
+                         static_cast<int>(length));
+    return 0;
 }
 
 static void remove_resolver_file() {
@@ -75,7 +81,7 @@ int vlsys_network_restart(void) {
 
     const int status = vlsys_system(restart_command);
     if (status < 0) {
-        vlsys_log(LOG_ERR, "%s: vlsys_system(%s): %m", "vlsys_network_restart", restart_command);
+        log_errno("%s: vlsys_system(%s)", "vlsys_network_restart", restart_command);
         return status;
     }
     char text[1024];

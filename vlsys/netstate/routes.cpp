@@ -2,6 +2,7 @@
 
 #include "core/lines.h"
 #include "core/log.h"
+#include "core/owners.h"
 #include "core/paths.h"
 #include "core/text.h"
 #include "netconf/interfaces.h"
@@ -18,15 +19,15 @@ static constexpr size_t line_size = 160;
 
 namespace {
 
-// The fields of a line, null from the first that is missing on.
+// The words of a line, null from the first that is missing on.
 template <size_t Count>
-struct Fields {
-    Fields(char *line, const char *separators) {
+struct Words {
+    Words(char *line, const char *separators) {
         char *rest = nullptr;
-        for (const char *&field : text) {
-            field = strtok_r(line, separators, &rest);
+        for (const char *&word : text) {
+            word = strtok_r(line, separators, &rest);
             line = nullptr;
-            if (!field)
+            if (!word)
                 return;
         }
     }
@@ -38,116 +39,163 @@ struct Fields {
     const char *text[Count] = {};
 };
 
+// What is read of a line of each table. The texts lie in the line's buffer, null when missing.
+struct Ipv6Route {
+    const char *destination;
+    const char *next_hop;
+    uint32_t references;
+    uint32_t flags;
+    const char *device;
+};
+
+struct Ipv4Route {
+    const char *interface;
+    uint32_t destination;
+    uint32_t gateway;
+    uint32_t mask;
+};
+
 } // namespace
 
-static File open_or_log(const char *path) {
-    File file(fopen(path, "re"));
-    if (!file)
-        vlsys_log(LOG_ERR, "%s: %m", path);
-    return file;
+static Ipv6Route parse_ipv6_route(char *line) {
+    const Words<10> words(line, " \t\n");
+    return {.destination = words.text[0],
+            .next_hop = words.text[4],
+            .references = words.hex(6, 0),
+            .flags = words.hex(8, 0),
+            .device = words.text[9]};
+}
+
+static Ipv4Route parse_ipv4_route(char *line) {
+    const Words<8> words(line, " \t");
+    return {.interface = words.text[0],
+            .destination = words.hex(1, UINT32_MAX),
+            .gateway = words.hex(2, UINT32_MAX),
+            .mask = words.hex(7, UINT32_MAX)};
+}
+
+static bool is_default_gateway(const Ipv6Route &route) {
+    constexpr std::string_view any = "00000000000000000000000000000000";
+    constexpr uint32_t needed = RTF_UP | RTF_GATEWAY;
+    return route.next_hop && route.destination == any && (route.flags & needed) == needed;
+}
+
+// With or without a gateway.
+static bool is_default_route(const Ipv4Route &route) {
+    return route.mask == 0 && route.destination == 0;
 }
 
 // 32 hexadecimal digits; a group of eight that is missing counts as 0.
-static in6_addr parse_next_hop(const char *field) {
+static in6_addr parse_next_hop(const char *word) {
     char digits[33] = {};
-    vlsys_strlcpy(digits, field, sizeof digits);
+    vlsys_strlcpy(digits, word, sizeof digits);
     in6_addr address;
-    for (size_t word = 0; word < 4; word++) {
+    for (size_t i = 0; i < 4; i++) {
         char group[9];
-        vlsys_strlcpy(group, digits + 8 * word, sizeof group);
-        address.s6_addr32[word] = htonl(static_cast<uint32_t>(parse_uint(group, 16)));
+        vlsys_strlcpy(group, digits + 8 * i, sizeof group);
+        address.s6_addr32[i] = htonl(static_cast<uint32_t>(parse_uint(group, 16)));
     }
     return address;
 }
 
-int read_ipv6_gateway(FILE *table, vlsys_gw6 *gw) {
-    enum { destination = 0, next_hop = 4, references = 6, flags = 8, device = 9, count };
-    constexpr std::string_view any = "00000000000000000000000000000000";
-    constexpr uint32_t needed = RTF_UP | RTF_GATEWAY;
-
-    char line[line_size];
-    while (read_line(table, line, sizeof line) > 0) {
-        const Fields<count> fields(line, " \t\n");
-        if (!fields.text[next_hop] || fields.text[destination] != any ||
-            (fields.hex(flags, 0) & needed) != needed)
-            continue;
-
-        sockaddr_in6 sa = {};
-        sa.sin6_family = AF_INET6;
-        sa.sin6_addr = parse_next_hop(fields.text[next_hop]);
-        const int result = addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof sa,
-                                        gw->addr, sizeof gw->addr, "v6gateway");
-        if (result != 0)
-            return result;
-        if (fields.text[device]) {
-            if (IN6_IS_ADDR_LINKLOCAL(&sa.sin6_addr)) {
-                vlsys_strlcat(gw->addr, "%", sizeof gw->addr);
-                vlsys_strlcat(gw->addr, fields.text[device], sizeof gw->addr);
-            }
-            vlsys_strlcpy(gw->iface, fields.text[device], sizeof gw->iface);
+static int take_gateway(const Ipv6Route &route, vlsys_gw6 *gw) {
+    sockaddr_in6 sa = {};
+    sa.sin6_family = AF_INET6;
+    sa.sin6_addr = parse_next_hop(route.next_hop);
+    const int result = addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof sa, gw->addr,
+                                    sizeof gw->addr, "v6gateway");
+    if (result != 0)
+        return result;
+    if (route.device) {
+        if (IN6_IS_ADDR_LINKLOCAL(&sa.sin6_addr)) {
+            vlsys_strlcat(gw->addr, "%", sizeof gw->addr);
+            vlsys_strlcat(gw->addr, route.device, sizeof gw->addr);
         }
-        // The appliance's kernel holds a learnt route more than once; recent ones count uses.
-        gw->mode = fields.hex(references, 0) == 1 ? VLSYS_MODE_MANUAL : VLSYS_MODE_AUTO;
-        return 0;
+        vlsys_strlcpy(gw->iface, route.device, sizeof gw->iface);
     }
+    // The appliance's kernel holds a learnt route more than once; recent ones count uses.
+    gw->mode = route.references == 1 ? VLSYS_MODE_MANUAL : VLSYS_MODE_AUTO;
     return 0;
+}
+
+static int take_gateway(const Ipv4Route &route, vlsys_gw4 *gw) {
+    sockaddr_in sa = {};
+    sa.sin_family = AF_INET;
+    sa.sin_addr.s_addr = route.gateway;
+    const int result = addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof sa, gw->addr,
+                                    sizeof gw->addr, "gateway");
+    if (result == 0)
+        vlsys_strlcpy(gw->iface, route.interface, sizeof gw->iface);
+    return result;
+}
+
+int read_ipv6_gateway(FILE *table, vlsys_gw6 *gw) {
+    char line[line_size];
+    int result = 0;
+    while ((result = read_line(table, line, sizeof line)) > 0) {
+        const Ipv6Route route = parse_ipv6_route(line);
+        if (is_default_gateway(route))
+            return take_gateway(route, gw);
+    }
+    return result < 0 ? -log_errno("fgets(%s)", ipv6_route_path) : 0;
 }
 
 int read_ipv4_gateway(FILE *table, vlsys_gw4 *gw) {
-    enum { interface = 0, destination = 1, gateway = 2, mask = 7, count };
-
     char line[line_size];
-    while (read_line(table, line, sizeof line) > 0) {
-        const Fields<count> fields(line, " \t");
-        if (fields.hex(mask, UINT32_MAX) != 0 || fields.hex(destination, UINT32_MAX) != 0)
-            continue;
-
-        sockaddr_in sa = {};
-        sa.sin_family = AF_INET;
-        sa.sin_addr.s_addr = fields.hex(gateway, UINT32_MAX);
-        const int result = addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof sa,
-                                        gw->addr, sizeof gw->addr, "gateway");
-        if (result == 0)
-            vlsys_strlcpy(gw->iface, fields.text[interface], sizeof gw->iface);
-        return result;
+    int result = 0;
+    while ((result = read_line(table, line, sizeof line)) > 0) {
+        const Ipv4Route route = parse_ipv4_route(line);
+        if (is_default_route(route))
+            return take_gateway(route, gw);
     }
-    return 0;
+    return result < 0 ? -log_errno("fgets(%s)", route_path) : 0;
 }
 
-static bool names_gateway(FILE *network) {
-    bool found = false;
+// Whether the network file names a gateway: 1, 0, or the negated errno, logged.
+static int names_gateway(const char *path) {
+    const File network(fopen(path, "re"));
+    if (!network)
+        return log_errno("%s", path);
+    bool named = false;
     char line[line_size];
-    while (read_line(network, line, sizeof line) > 0)
-        found |= starts_with(line, "GATEWAY=");
-    return found;
+    int result = 0;
+    while ((result = read_line(network.get(), line, sizeof line)) > 0)
+        named |= starts_with(line, "GATEWAY=");
+    return result < 0 ? log_errno("fgets(%s)", path) : named;
 }
 
-static bool learns_gateway(FILE *ifcfg) {
+// Whether an interface's file lets it learn a default route: 1, 0, or the negated errno, logged.
+static int learns_gateway(const char *path) {
+    const File ifcfg(fopen(path, "re"));
+    if (!ifcfg)
+        return log_errno("%s", path);
     bool dhcp = false;
     bool refused = false;
     char line[line_size];
-    while (read_line(ifcfg, line, sizeof line) > 0) {
+    int result = 0;
+    while ((result = read_line(ifcfg.get(), line, sizeof line)) > 0) {
         dhcp |= starts_with(line, "BOOTPROTO=dhcp");
         refused |= starts_with(line, "DEFROUTE=no");
     }
-    return dhcp && !refused;
+    return result < 0 ? log_errno("fgets(%s)", path) : dhcp && !refused;
 }
 
-// How the IPv4 gateway is configured. Returns 0, or the errno of a file that cannot be opened, with
-// the mode as far as it was found.
+// How the IPv4 gateway is configured. Returns 0, or the negated errno of a file that cannot be
+// read, with the mode as far as it was found.
 static int read_ipv4_gateway_mode(uint32_t *mode) {
-    const File network = open_or_log(SystemPath(network_path).text);
-    if (!network)
-        return errno;
-    if (names_gateway(network.get())) {
+    *mode = VLSYS_MODE_OFF;
+    const int named = names_gateway(SystemPath(network_path).text);
+    if (named < 0)
+        return named;
+    if (named > 0) {
         *mode = VLSYS_MODE_MANUAL;
         return 0;
     }
     for (const auto &name : InterfaceList()) {
-        const File ifcfg = open_or_log(SystemPath(ifcfg_prefix, name).text);
-        if (!ifcfg)
-            return errno;
-        if (learns_gateway(ifcfg.get()))
+        const int learnt = learns_gateway(SystemPath(ifcfg_prefix, name).text);
+        if (learnt < 0)
+            return learnt;
+        if (learnt > 0)
             *mode = VLSYS_MODE_DHCP;
     }
     return 0;
@@ -160,9 +208,9 @@ using namespace vlsys;
 int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw) {
     if (!gw)
         return EFAULT;
-    const File table = open_or_log(ipv6_route_path);
+    const File table(fopen(ipv6_route_path, "re"));
     if (!table)
-        return errno;
+        return -log_errno("%s", ipv6_route_path);
     gw->iface[0] = '\0';
     gw->addr[0] = '\0';
     gw->mode = VLSYS_MODE_OFF;
@@ -172,17 +220,15 @@ int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw) {
 int vlsys_get_ipv4_default_gateway2(vlsys_gw4 *gw) {
     if (!gw)
         return EFAULT;
-    File table = open_or_log(route_path);
+    File table(fopen(route_path, "re"));
     if (!table)
-        return errno;
+        return -log_errno("%s", route_path);
     gw->iface[0] = '\0';
     gw->addr[0] = '\0';
     const int result = read_ipv4_gateway(table.get(), gw);
     table.reset();
-
-    gw->mode = VLSYS_MODE_OFF;
-    const int failure = read_ipv4_gateway_mode(&gw->mode);
-    return failure != 0 ? failure : result;
+    const int mode_result = read_ipv4_gateway_mode(&gw->mode);
+    return mode_result != 0 ? -mode_result : result;
 }
 
 int vlsys_get_ipv6_default_gateway(char *text) {
