@@ -27,59 +27,77 @@ static constexpr const char *field_labels[] = {
 
 static constexpr int first_netmask = VLSYS_CHECK_CODE(0, VLSYS_CHECK_FIELD_IPV4_NETMASK, 0);
 
+namespace {
+
+// The text of an address, and the field of a setting that it stands in.
+struct AddressField {
+    char *text;
+    size_t capacity;
+    int code;
+    const char *label; // null when the code is not that of a field with a label
+};
+
+} // namespace
+
+static AddressField make_field(char *text, size_t capacity, int fieldcode) {
+    const int number = VLSYS_CHECK_FIELD(fieldcode);
+    const bool has_label =
+        number >= VLSYS_CHECK_FIELD_IPV4_ADDR && number <= VLSYS_CHECK_FIELD_HOSTNAME;
+    return {text, capacity, fieldcode, has_label ? field_labels[number] : nullptr};
+}
+
 int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, size_t textcap,
                  const char *label) {
     // The resolver may write a part of what turns out too long for the caller's buffer.
     char written[NI_MAXHOST];
-    const auto capacity = static_cast<socklen_t>(std::min(textcap, sizeof(written)));
+    const auto capacity = static_cast<socklen_t>(std::min(textcap, sizeof written));
     const int error = getnameinfo(addr, addrlen, written, capacity, nullptr, 0, NI_NUMERICHOST);
-    if (error == 0) {
-        vlsys_strlcpy(text, written, textcap);
-        return 0;
+    if (error == EAI_SYSTEM)
+        return -log_errno("%s: getnameinfo", label);
+    if (error != 0) {
+        vlsys_log(LOG_ERR, "%s: getnameinfo: %s", label, gai_strerror(error));
+        return error;
     }
-    if (error == EAI_SYSTEM) {
-        vlsys_log(LOG_ERR, "%s: getnameinfo: %m", label);
-        return errno;
-    }
-    vlsys_log(LOG_ERR, "%s: getnameinfo: %s", label, gai_strerror(error));
-    return error;
+    vlsys_strlcpy(text, written, textcap);
+    return 0;
 }
 
-// The steps that both families share: the address of the text, and the field's label.
-static int text_to_addr(int family, void *out, size_t size, const char *field, size_t capacity,
-                        int fieldcode, const char **label) {
-    const int number = VLSYS_CHECK_FIELD(fieldcode);
-    if (number < VLSYS_CHECK_FIELD_IPV4_ADDR || number > VLSYS_CHECK_FIELD_HOSTNAME)
+static int text_to_addr(const AddressField &field, int family, void *out, size_t size) {
+    if (!field.label)
         return EINVAL;
-    *label = field_labels[number];
-    if (!field) {
-        vlsys_log(LOG_ERR, "%s: str: %m", *label);
+    if (!field.text) {
+        log_errno("%s: str", field.label);
         return EFAULT;
     }
     if (!out) {
-        vlsys_log(LOG_ERR, "%s: sa: %m", *label);
+        log_errno("%s: sa", field.label);
         return EFAULT;
     }
 
     // A field that is full has no NUL.
     char text[VLSYS_ADDR6_SIZE + 1];
-    snprintf(text, sizeof(text), "%.*s", static_cast<int>(capacity), field);
+    snprintf(text, sizeof text, "%.*s", static_cast<int>(field.capacity), field.text);
     addrinfo hints = {};
     hints.ai_flags = AI_NUMERICHOST;
     hints.ai_family = family;
     addrinfo *result = nullptr;
     const int error = getaddrinfo(text, nullptr, &hints, &result);
-    if (error == EAI_SYSTEM) {
-        vlsys_log(LOG_ERR, "%s: %s: %m", *label, text);
-        return errno;
-    }
+    if (error == EAI_SYSTEM)
+        return -log_errno("%s: %s", field.label, text);
     if (error != 0) {
-        vlsys_log(LOG_ERR, "%s: %s: %s", *label, text, gai_strerror(error));
-        return fieldcode | VLSYS_CHECK_KIND_INVALID;
+        vlsys_log(LOG_ERR, "%s: %s: %s", field.label, text, gai_strerror(error));
+        return field.code | VLSYS_CHECK_KIND_INVALID;
     }
     const AddressList list(result);
     memcpy(out, list->ai_addr, size);
     return 0;
+}
+
+// Rewrites the text in canonical form.
+template <class Address>
+static int rewrite(const AddressField &field, const Address *address) {
+    return addr_to_text(reinterpret_cast<const sockaddr *>(address), sizeof *address, field.text,
+                        field.capacity, field.label);
 }
 
 static bool is_global_unicast(const in6_addr &address) {
@@ -91,10 +109,8 @@ static bool is_unique_local(const in6_addr &address) {
 }
 
 int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
-    const char *label = nullptr;
-    const int error =
-        text_to_addr(AF_INET6, out, sizeof(*out), text, VLSYS_ADDR6_SIZE, fieldcode, &label);
-    if (error != 0)
+    const AddressField field = make_field(text, VLSYS_ADDR6_SIZE, fieldcode);
+    if (const int error = text_to_addr(field, AF_INET6, out, sizeof *out))
         return error;
 
     const in6_addr &address = out->sin6_addr;
@@ -104,22 +120,26 @@ int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
     } else if (!is_global_unicast(address) && !is_unique_local(address)) {
         return fieldcode | VLSYS_CHECK_KIND_RANGE;
     }
-    return addr_to_text(reinterpret_cast<const sockaddr *>(out), sizeof(*out), text,
-                        VLSYS_ADDR6_SIZE, label);
+    return rewrite(field, out);
+}
+
+int check_netmask_text(struct sockaddr_in *out, char *text, size_t textcap, int fieldcode) {
+    const AddressField field = make_field(text, textcap, fieldcode);
+    const int error = text_to_addr(field, AF_INET, out, sizeof *out);
+    return error != 0 ? error : rewrite(field, out);
 }
 
 int check_ipv4_text(struct sockaddr_in *out, char *text, size_t textcap, int fieldcode) {
-    const char *label = nullptr;
-    const int error = text_to_addr(AF_INET, out, sizeof(*out), text, textcap, fieldcode, &label);
-    if (error != 0)
+    if (fieldcode == first_netmask)
+        return check_netmask_text(out, text, textcap, fieldcode);
+    const AddressField field = make_field(text, textcap, fieldcode);
+    if (const int error = text_to_addr(field, AF_INET, out, sizeof *out))
         return error;
 
     const uint32_t address = ntohl(out->sin_addr.s_addr);
-    if (fieldcode != first_netmask &&
-        (address == 0 || address >> 24 == 127 || address >> 24 >= 224))
+    if (address == 0 || address >> 24 == 127 || address >> 24 >= 224)
         return fieldcode | VLSYS_CHECK_KIND_RANGE;
-    return addr_to_text(reinterpret_cast<const sockaddr *>(out), sizeof(*out), text, textcap,
-                        label);
+    return rewrite(field, out);
 }
 
 int parse_uint(const char *text, int base) {

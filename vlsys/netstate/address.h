@@ -29,9 +29,12 @@ int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode);
 // 224.0.0.0 on, unless the field is the first interface's netmask.
 int check_ipv4_text(struct sockaddr_in *out, char *text, size_t textcap, int fieldcode);
 
+// The netmask of any interface: the same without a refused range.
+int check_netmask_text(struct sockaddr_in *out, char *text, size_t textcap, int fieldcode);
+
 // Whether a text field is to be taken for an IPv6 address.
 inline bool is_ipv6_text(const char (&text)[VLSYS_ADDR6_SIZE]) {
-    return memchr(text, ':', strnlen(text, sizeof(text)));
+    return memchr(text, ':', strnlen(text, sizeof text));
 }
 
 // The number at the start of the text (0 without digits), or -1 when it is negative or has more

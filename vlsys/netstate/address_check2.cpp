@@ -14,7 +14,9 @@
 
 namespace vlsys {
 
-static_assert(sizeof(Subnet4) == 16 && sizeof(Subnet6) == 48);
+static_assert(sizeof(Subnet4) == 16 && sizeof(Subnet6) == 48); // as their messages have it
+
+namespace {
 
 // All interfaces, and what the rules that follow theirs need to know of them.
 struct Network {
@@ -30,6 +32,21 @@ struct Network {
     bool gw6_accepted = false;
 };
 
+// Where an address lies among the fixed subnets.
+struct Place {
+    int position; // of the last subnet that contains it, or -1
+    int fault;    // code when it is the network or broadcast address of that one, or 0
+};
+
+// Two interfaces by position: the second one's address lies in the first one's subnet.
+struct Overlap {
+    bool found;
+    size_t first;
+    size_t second;
+};
+
+} // namespace
+
 static int check_name(const vlsys_ifconf &nif, int position) {
     const FieldText name(nif.name);
     // The second port may be set before it is there, so it is not looked up.
@@ -42,43 +59,59 @@ static int check_name(const vlsys_ifconf &nif, int position) {
     return field_code(VLSYS_CHECK_FIELD_IFNAME, position) | VLSYS_CHECK_KIND_NO_IFACE;
 }
 
-static int check_interfaces_ipv4(Network &network) {
-    for (size_t i = 0; i < network.nifs.size(); i++) {
-        vlsys_ifconf &nif = network.nifs[i];
+static int check_interfaces_ipv4(Network *network) {
+    for (size_t i = 0; i < network->nifs.size(); i++) {
+        vlsys_ifconf *const nif = &network->nifs[i];
         const int position = static_cast<int>(i);
-        if (const int fault = check_name(nif, position))
+        if (const int fault = check_name(*nif, position))
             return fault;
-        network.ipv4_on += nif.ipv4_mode != VLSYS_MODE_OFF;
-        network.ipv4_dhcp += nif.ipv4_mode == VLSYS_MODE_DHCP;
-        if (nif.ipv4_mode != VLSYS_MODE_MANUAL)
+        network->ipv4_on += nif->ipv4_mode != VLSYS_MODE_OFF;
+        network->ipv4_dhcp += nif->ipv4_mode == VLSYS_MODE_DHCP;
+        if (nif->ipv4_mode != VLSYS_MODE_MANUAL)
             continue;
-        int conversion = 0; // a broadcast address without text has been logged, and that is all
-        if (const int fault =
-                check_static_ipv4(Validator::multi, nif, position, network.subnets4[i], conversion))
+        Subnet4 *const subnet = &network->subnets4[i];
+        if (const int fault = check_static_ipv4(Validator::multi, nif, position, subnet))
+            return fault;
+        set_broadcast(nif, *subnet);
+    }
+    return 0;
+}
+
+static int check_interfaces_ipv6(Network *network) {
+    for (size_t i = 0; i < network->nifs.size(); i++) {
+        vlsys_ifconf *const nif = &network->nifs[i];
+        network->ipv6_on += nif->ipv6_mode != VLSYS_MODE_OFF;
+        network->ipv6_dhcp += nif->ipv6_mode == VLSYS_MODE_DHCP;
+        network->ipv6_auto += nif->ipv6_mode == VLSYS_MODE_AUTO;
+        if (nif->ipv6_mode != VLSYS_MODE_MANUAL)
+            continue;
+        if (const int fault = check_static_ipv6(nif, static_cast<int>(i), &network->subnets6[i]))
             return fault;
     }
     return 0;
 }
 
-static int check_interfaces_ipv6(Network &network) {
-    for (size_t i = 0; i < network.nifs.size(); i++) {
-        vlsys_ifconf &nif = network.nifs[i];
-        network.ipv6_on += nif.ipv6_mode != VLSYS_MODE_OFF;
-        network.ipv6_dhcp += nif.ipv6_mode == VLSYS_MODE_DHCP;
-        network.ipv6_auto += nif.ipv6_mode == VLSYS_MODE_AUTO;
-        if (nif.ipv6_mode != VLSYS_MODE_MANUAL)
+// The first pair, in list order.
+template <class Subnet>
+static Overlap find_overlap(std::span<const Subnet> subnets) {
+    for (size_t i = 0; i < subnets.size(); i++) {
+        if (!subnets[i].is_set())
             continue;
-        if (const int fault = check_static_ipv6(nif, static_cast<int>(i), network.subnets6[i]))
-            return fault;
+        for (size_t j = 0; j < subnets.size(); j++)
+            if (subnets[i].contains(subnets[j].address) && j != i && subnets[j].is_set())
+                return {true, i, j};
     }
-    return 0;
+    return {false, 0, 0};
 }
 
-static int overlap4(const Network &network, size_t i, size_t j) {
-    const vlsys_ifconf &a = network.nifs[i];
-    const vlsys_ifconf &b = network.nifs[j];
-    const Subnet4 &subnet = network.subnets4[i];
-    const uint32_t address = network.subnets4[j].address;
+static int check_overlap4(const Network &network) {
+    const Overlap overlap = find_overlap<Subnet4>(network.subnets4);
+    if (!overlap.found)
+        return 0;
+    const vlsys_ifconf &a = network.nifs[overlap.first];
+    const vlsys_ifconf &b = network.nifs[overlap.second];
+    const Subnet4 &subnet = network.subnets4[overlap.first];
+    const uint32_t address = network.subnets4[overlap.second].address;
     if (address == subnet.address) {
         vlsys_log(LOG_ERR, "%s and %s is same address: %s", a.name, b.name, a.addr);
     } else {
@@ -88,87 +121,64 @@ static int overlap4(const Network &network, size_t i, size_t j) {
     return field_code(VLSYS_CHECK_FIELD_IPV4_ADDR) | VLSYS_CHECK_KIND_OVERLAP;
 }
 
-// Looks for the first pair, in list order, of which the second interface's address lies in the
-// first one's subnet.
-template <class Subnet>
-static bool find_overlap(std::span<const Subnet> subnets, size_t &i, size_t &j) {
-    for (i = 0; i < subnets.size(); i++) {
-        if (!subnets[i].is_set())
-            continue;
-        for (j = 0; j < subnets.size(); j++)
-            if (subnets[i].contains(subnets[j].address) && j != i && subnets[j].is_set())
-                return true;
-    }
-    return false;
-}
-
-static int check_overlap4(const Network &network) {
-    size_t i = 0;
-    size_t j = 0;
-    return find_overlap<Subnet4>(network.subnets4, i, j) ? overlap4(network, i, j) : 0;
-}
-
 static int check_overlap6(const Network &network) {
-    size_t i = 0;
-    size_t j = 0;
-    if (!find_overlap<Subnet6>(network.subnets6, i, j))
+    if (!find_overlap<Subnet6>(network.subnets6).found)
         return 0;
     return field_code(VLSYS_CHECK_FIELD_IPV6_ADDR) | VLSYS_CHECK_KIND_OVERLAP;
 }
 
-// Looks up a gateway or server in the fixed subnets: `match` is the position of the last one that
-// holds it, or -1. A fault when it is one's network or broadcast address.
+// Looks for the subnets that contain the address of a field; ends at a fault.
 template <class Subnet, class Address>
-static int locate(std::span<const Subnet> subnets, const Address &address, const char *label,
-                  const char *text, int fieldcode, int &match) {
-    match = -1;
-    for (size_t j = 0; j < subnets.size(); j++) {
-        if (!subnets[j].is_set() || !subnets[j].contains(address))
+static Place find_place(std::span<const Subnet> subnets, const Address &address, int field,
+                        const char *label, const char *text) {
+    Place place = {-1, 0};
+    for (size_t i = 0; i < subnets.size() && place.fault == 0; i++) {
+        if (!subnets[i].is_set() || !subnets[i].contains(address))
             continue;
-        match = static_cast<int>(j);
-        if (const int fault =
-                check_not_reserved(subnets[j], address, label, text, fieldcode + match * 0x100))
-            return fault;
+        place.position = static_cast<int>(i);
+        place.fault =
+            check_not_reserved(subnets[i], address, label, text, field_code(field, place.position));
     }
-    return 0;
+    return place;
 }
 
-static int check_static_gateway4(Network &network, vlsys_gw4 &gw) {
+static int check_static_gateway4(Network *network, vlsys_gw4 *gw) {
     const int fieldcode = field_code(VLSYS_CHECK_FIELD_IPV4_GATEWAY);
-    if (network.ipv4_on == 0)
+    if (network->ipv4_on == 0)
         return fieldcode | VLSYS_CHECK_KIND_MODE;
     sockaddr_in sa = {};
-    if (const int error = check_ipv4_text(&sa, gw.addr, sizeof(gw.addr), fieldcode))
+    if (const int error = check_ipv4_text(&sa, gw->addr, sizeof gw->addr, fieldcode))
         return error;
 
-    int match = -1;
-    const int fault =
-        locate<Subnet4>(network.subnets4, host_order(sa), "gateway", gw.addr, fieldcode, match);
-    if (match >= 0)
-        vlsys_strlcpy(gw.iface, network.nifs[static_cast<size_t>(match)].name, sizeof(gw.iface));
-    if (fault != 0)
-        return fault;
-    network.gw4_accepted = match >= 0 || network.ipv4_dhcp > 0;
-    return network.gw4_accepted ? 0 : unreachable("gateway", gw.addr, fieldcode);
+    const Place place = find_place<Subnet4>(network->subnets4, host_order(sa),
+                                            VLSYS_CHECK_FIELD_IPV4_GATEWAY, "gateway", gw->addr);
+    if (place.position >= 0)
+        vlsys_strlcpy(gw->iface, network->nifs[static_cast<size_t>(place.position)].name,
+                      sizeof gw->iface);
+    if (place.fault != 0)
+        return place.fault;
+    network->gw4_accepted = place.position >= 0 || network->ipv4_dhcp > 0;
+    return network->gw4_accepted ? 0 : unreachable("gateway", gw->addr, fieldcode);
 }
 
-static int check_static_gateway6(Network &network, vlsys_gw6 &gw) {
+static int check_static_gateway6(Network *network, vlsys_gw6 *gw) {
     const int fieldcode = field_code(VLSYS_CHECK_FIELD_IPV6_GATEWAY);
-    if (network.ipv6_on == 0)
+    if (network->ipv6_on == 0)
         return fieldcode | VLSYS_CHECK_KIND_MODE;
     sockaddr_in6 sa = {};
-    if (const int error = check_ipv6_text(&sa, gw.addr, fieldcode))
+    if (const int error = check_ipv6_text(&sa, gw->addr, fieldcode))
         return error;
 
-    network.gw6_accepted = IN6_IS_ADDR_LINKLOCAL(&sa.sin6_addr);
-    if (network.gw6_accepted)
+    network->gw6_accepted = IN6_IS_ADDR_LINKLOCAL(&sa.sin6_addr);
+    if (network->gw6_accepted)
         return 0;
-    int match = -1;
-    if (const int fault = locate<Subnet6>(network.subnets6, host_order(sa), "IPv6 gateway", gw.addr,
-                                          fieldcode, match))
-        return fault;
-    network.gw6_accepted = match >= 0 || network.ipv6_dhcp > 0 || network.ipv6_auto > 0;
-    return network.gw6_accepted ? 0 : unreachable("IPv6 gateway", gw.addr, fieldcode);
+    const Place place =
+        find_place<Subnet6>(network->subnets6, host_order(sa), VLSYS_CHECK_FIELD_IPV6_GATEWAY,
+                            "IPv6 gateway", gw->addr);
+    if (place.fault != 0)
+        return place.fault;
+    network->gw6_accepted = place.position >= 0 || network->ipv6_dhcp > 0 || network->ipv6_auto > 0;
+    return network->gw6_accepted ? 0 : unreachable("IPv6 gateway", gw->addr, fieldcode);
 }
 
 // A gateway that is learnt must name an interface that can learn it, or one that is not listed.
@@ -182,23 +192,23 @@ static int check_learnt_gateway(const Network &network, uint32_t vlsys_ifconf::*
     return 0;
 }
 
-static int check_gateway4(Network &network, vlsys_gw4 &gw) {
-    if (gw.mode == VLSYS_MODE_MANUAL && gw.addr[0] != '\0')
+static int check_gateway4(Network *network, vlsys_gw4 *gw) {
+    if (gw->mode == VLSYS_MODE_MANUAL && gw->addr[0] != '\0')
         return check_static_gateway4(network, gw);
-    if (gw.mode == VLSYS_MODE_DHCP)
-        return check_learnt_gateway(network, &vlsys_ifconf::ipv4_mode, gw.iface,
+    if (gw->mode == VLSYS_MODE_DHCP)
+        return check_learnt_gateway(*network, &vlsys_ifconf::ipv4_mode, gw->iface,
                                     field_code(VLSYS_CHECK_FIELD_IPV4_GATEWAY));
-    gw = {};
+    *gw = {};
     return 0;
 }
 
-static int check_gateway6(Network &network, vlsys_gw6 &gw) {
-    if (gw.mode == VLSYS_MODE_MANUAL && gw.addr[0] != '\0')
+static int check_gateway6(Network *network, vlsys_gw6 *gw) {
+    if (gw->mode == VLSYS_MODE_MANUAL && gw->addr[0] != '\0')
         return check_static_gateway6(network, gw);
-    if (gw.mode == VLSYS_MODE_DHCP || gw.mode == VLSYS_MODE_AUTO)
-        return check_learnt_gateway(network, &vlsys_ifconf::ipv6_mode, gw.iface,
+    if (gw->mode == VLSYS_MODE_DHCP || gw->mode == VLSYS_MODE_AUTO)
+        return check_learnt_gateway(*network, &vlsys_ifconf::ipv6_mode, gw->iface,
                                     field_code(VLSYS_CHECK_FIELD_IPV6_GATEWAY));
-    gw = {};
+    *gw = {};
     return 0;
 }
 
@@ -210,13 +220,13 @@ static int check_server4(const Network &network, const DnsServer &server) {
     if (network.ipv4_on == 0)
         return unreachable_server(server);
     sockaddr_in sa = {};
-    if (const int error = check_ipv4_text(&sa, server.text, sizeof(server.text), server.fieldcode))
+    if (const int error = check_ipv4_text(&sa, server.text, sizeof server.text, server.fieldcode))
         return error;
-    int match = -1;
-    if (const int fault = locate<Subnet4>(network.subnets4, host_order(sa), server.label,
-                                          server.text, server.fieldcode, match))
-        return fault;
-    const bool accepted = match >= 0 || network.ipv4_dhcp > 0 || network.gw4_accepted;
+    const Place place = find_place<Subnet4>(network.subnets4, host_order(sa), server.field,
+                                            server.label, server.text);
+    if (place.fault != 0)
+        return place.fault;
+    const bool accepted = place.position >= 0 || network.ipv4_dhcp > 0 || network.gw4_accepted;
     return accepted ? 0 : unreachable_server(server);
 }
 
@@ -226,12 +236,12 @@ static int check_server6(const Network &network, const DnsServer &server) {
     sockaddr_in6 sa = {};
     if (const int error = check_ipv6_text(&sa, server.text, server.fieldcode))
         return error;
-    int match = -1;
-    if (const int fault = locate<Subnet6>(network.subnets6, host_order(sa), server.label,
-                                          server.text, server.fieldcode, match))
-        return fault;
-    const bool accepted =
-        match >= 0 || network.ipv6_dhcp > 0 || network.ipv6_auto > 0 || network.gw6_accepted;
+    const Place place = find_place<Subnet6>(network.subnets6, host_order(sa), server.field,
+                                            server.label, server.text);
+    if (place.fault != 0)
+        return place.fault;
+    const bool accepted = place.position >= 0 || network.ipv6_dhcp > 0 || network.ipv6_auto > 0 ||
+                          network.gw6_accepted;
     return accepted ? 0 : unreachable_server(server);
 }
 
@@ -242,11 +252,11 @@ static bool is_repeated_later(const vlsys_dns &dns, int index) {
     return false;
 }
 
-static int check_static_dns(const Network &network, vlsys_dns &dns) {
-    vlsys_log(LOG_DEBUG, "domain: %s", FieldText(dns.domain).text);
+static int check_static_dns(const Network &network, vlsys_dns *dns) {
+    vlsys_log(LOG_DEBUG, "domain: %s", FieldText(dns->domain).text);
     for (int k = 0; k < 2; k++)
-        vlsys_log(LOG_DEBUG, "server[%d]: %s", k, FieldText(dns.server[k]).text);
-    if (const int fault = check_domain(dns))
+        vlsys_log(LOG_DEBUG, "server[%d]: %s", k, FieldText(dns->server[k]).text);
+    if (const int fault = check_domain(*dns))
         return fault;
 
     bool given = false;
@@ -255,7 +265,7 @@ static int check_static_dns(const Network &network, vlsys_dns &dns) {
         if (server.text[0] == '\0')
             continue;
         given = true;
-        if (is_repeated_later(dns, k)) {
+        if (is_repeated_later(*dns, k)) {
             server.text[0] = '\0';
             continue;
         }
@@ -282,56 +292,57 @@ static int check_dns_mode(const Network &network, uint32_t mode) {
 }
 
 // The first interface that is on carries a fixed setting, the first one with DHCP a learnt one.
-static void set_dns_iface(const Network &network, vlsys_dns &dns) {
+static void set_dns_iface(const Network &network, vlsys_dns *dns) {
     for (const vlsys_ifconf &nif : network.nifs) {
         const bool carries =
-            dns.mode == VLSYS_MODE_DHCP
+            dns->mode == VLSYS_MODE_DHCP
                 ? nif.ipv4_mode == VLSYS_MODE_DHCP || nif.ipv6_mode == VLSYS_MODE_DHCP
                 : nif.ipv4_mode != VLSYS_MODE_OFF || nif.ipv6_mode != VLSYS_MODE_OFF;
         if (carries) {
-            vlsys_strlcpy(dns.iface, nif.name, sizeof(dns.iface));
+            vlsys_strlcpy(dns->iface, nif.name, sizeof dns->iface);
             return;
         }
     }
 }
 
-static int check_dns(const Network &network, vlsys_dns &dns) {
-    if (const int fault = check_dns_mode(network, dns.mode))
+static int check_dns(const Network &network, vlsys_dns *dns) {
+    if (const int fault = check_dns_mode(network, dns->mode))
         return fault;
-    vlsys_log(LOG_DEBUG, "dns->mode: %d", static_cast<int>(dns.mode));
-    if (dns.mode == VLSYS_MODE_MANUAL)
+    vlsys_log(LOG_DEBUG, "dns->mode: %d", static_cast<int>(dns->mode));
+    if (dns->mode == VLSYS_MODE_MANUAL)
         if (const int fault = check_static_dns(network, dns))
             return fault;
-    if (dns.mode == VLSYS_MODE_MANUAL || dns.mode == VLSYS_MODE_DHCP)
+    if (dns->mode == VLSYS_MODE_MANUAL || dns->mode == VLSYS_MODE_DHCP)
         set_dns_iface(network, dns);
-    vlsys_log(LOG_DEBUG, "dns->iface: %s", FieldText(dns.iface).text);
+    vlsys_log(LOG_DEBUG, "dns->iface: %s", FieldText(dns->iface).text);
     return 0;
 }
 
-static int check_network(Network &network, vlsys_gw4 &gw4, vlsys_gw6 &gw6, vlsys_dns &dns,
+static int check_network(Network *network, vlsys_gw4 *gw4, vlsys_gw6 *gw6, vlsys_dns *dns,
                          char *hostname) {
     if (const int fault = check_interfaces_ipv4(network))
         return fault;
-    if (const int fault = check_overlap4(network))
+    if (const int fault = check_overlap4(*network))
         return fault;
     if (const int fault = check_gateway4(network, gw4))
         return fault;
     if (const int fault = check_interfaces_ipv6(network))
         return fault;
-    if (const int fault = check_overlap6(network))
+    if (const int fault = check_overlap6(*network))
         return fault;
     if (const int fault = check_gateway6(network, gw6))
         return fault;
-    if (const int fault = check_dns(network, dns))
+    if (const int fault = check_dns(*network, dns))
         return fault;
     return check_hostname(hostname);
 }
 
-static void *allocate(const char *name, int size, int count) {
-    void *table = calloc(static_cast<size_t>(size), static_cast<size_t>(count));
+template <class Subnet>
+static Owned<Subnet[]> allocate(const char *name, int count) {
+    void *const table = calloc(sizeof(Subnet), static_cast<size_t>(count));
     if (!table)
-        vlsys_log(LOG_ERR, "%s = calloc(%d, %d: %m", name, size, count);
-    return table;
+        log_errno("%s = calloc(%d, %d", name, static_cast<int>(sizeof(Subnet)), count);
+    return Owned<Subnet[]>(static_cast<Subnet *>(table));
 }
 
 } // namespace vlsys
@@ -345,15 +356,15 @@ int vlsys_address_check2(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw
     const auto size = static_cast<size_t>(count);
     vlsys_log(LOG_INFO, "%s: mode: %s", "start checking",
               summarize_modes({nifs, size}, *gw4, *gw6, *dns).text);
-    const Owned<Subnet4[]> subnets4(static_cast<Subnet4 *>(allocate("v4", sizeof(Subnet4), count)));
+    const auto subnets4 = allocate<Subnet4>("v4", count);
     if (!subnets4)
         return errno;
-    const Owned<Subnet6[]> subnets6(static_cast<Subnet6 *>(allocate("v6", sizeof(Subnet6), count)));
+    const auto subnets6 = allocate<Subnet6>("v6", count);
     if (!subnets6)
         return errno;
 
     Network network = {{nifs, size}, {subnets4.get(), size}, {subnets6.get(), size}};
-    const int result = check_network(network, *gw4, *gw6, *dns, hostname);
+    const int result = check_network(&network, gw4, gw6, dns, hostname);
     if (result == 0)
         vlsys_log(LOG_INFO, "%s: OK", "vlsys_address_check2");
     else

@@ -26,15 +26,15 @@ using Entries = std::unique_ptr<ifaddrs, FreeEntries>;
 } // namespace
 
 template <size_t Size>
-static uint8_t leading_ones(const uint8_t (&mask)[Size]) {
-    uint8_t count = 0;
+static uint8_t prefix_length(const uint8_t (&mask)[Size]) {
+    uint8_t length = 0;
     for (const uint8_t byte : mask) {
         const int ones = std::countl_one(byte);
-        count = static_cast<uint8_t>(count + ones);
+        length = static_cast<uint8_t>(length + ones);
         if (ones < 8)
             break;
     }
-    return count;
+    return length;
 }
 
 static void read_link(const ifaddrs &entry, vlsys_ifconf &nif) {
@@ -61,7 +61,7 @@ static int read_ipv4(const ifaddrs &entry, vlsys_ifconf &nif) {
         return result;
     uint8_t mask[sizeof(in_addr)];
     memcpy(mask, &reinterpret_cast<const sockaddr_in *>(entry.ifa_netmask)->sin_addr, sizeof mask);
-    nif.prefix = leading_ones(mask);
+    nif.prefix = prefix_length(mask);
     return 0;
 }
 
@@ -92,7 +92,7 @@ static int read_ipv6(const ifaddrs &entry, vlsys_ifconf &nif) {
     if (result != 0)
         return result;
     const auto *const mask = reinterpret_cast<const sockaddr_in6 *>(entry.ifa_netmask);
-    slot.prefix = leading_ones(mask->sin6_addr.s6_addr);
+    slot.prefix = prefix_length(mask->sin6_addr.s6_addr);
     nif.has_ipv6 = 1;
     return 0;
 }

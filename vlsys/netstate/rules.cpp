@@ -54,80 +54,74 @@ static bool is_prefix(int length) {
 
 // A prefix length becomes a mask, in the hexadecimal form that the address conversion then makes
 // dotted.
-static void set_netmask(vlsys_ifconf &nif, int length) {
+static void set_netmask(vlsys_ifconf *nif, int length) {
     if (!is_prefix(length))
         return;
     const uint32_t mask = UINT32_MAX << (32 - length);
     vlsys_log(LOG_DEBUG, "netmask: %d -> 0x%08x", length, mask);
-    snprintf(nif.netmask, sizeof(nif.netmask), "0x%08x", mask);
+    snprintf(nif->netmask, sizeof nif->netmask, "0x%08x", mask);
 }
 
-static int check_netmask(Validator validator, vlsys_ifconf &nif, int position, uint32_t &mask) {
+static int check_netmask(Validator validator, vlsys_ifconf *nif, int position, uint32_t *mask) {
     if (validator == Validator::multi)
-        set_netmask(nif, nif.prefix);
-    set_netmask(nif, parse_uint(FieldText(nif.netmask).text, 10));
+        set_netmask(nif, nif->prefix);
+    set_netmask(nif, parse_uint(FieldText(nif->netmask).text, 10));
 
-    // The first interface's field code, whatever the position: it lifts the range rule.
-    sockaddr_in sa = {};
-    const int error = check_ipv4_text(&sa, nif.netmask, sizeof(nif.netmask),
-                                      field_code(VLSYS_CHECK_FIELD_IPV4_NETMASK));
     const int fieldcode = field_code(VLSYS_CHECK_FIELD_IPV4_NETMASK, position);
-    if (error != 0)
-        return VLSYS_CHECK_IS_CODE(error) ? fieldcode | VLSYS_CHECK_KIND(error) : error;
-    mask = host_order(sa);
+    sockaddr_in sa = {};
+    if (const int error = check_netmask_text(&sa, nif->netmask, sizeof nif->netmask, fieldcode))
+        return error;
+    *mask = host_order(sa);
 
-    const int length = std::countl_one(mask);
+    const int length = std::countl_one(*mask);
     if (validator == Validator::multi) {
         if (!is_prefix(length))
             return fieldcode | VLSYS_CHECK_KIND_INVALID;
-        nif.prefix = static_cast<uint8_t>(length);
+        nif->prefix = static_cast<uint8_t>(length);
     }
-    if (length + std::countr_zero(mask) < 32) {
-        vlsys_log(LOG_ERR, "wrang bit pattern: %s(%08x)", nif.netmask, mask);
+    if (length + std::countr_zero(*mask) < 32) {
+        vlsys_log(LOG_ERR, "wrang bit pattern: %s(%08x)", nif->netmask, *mask);
         return fieldcode | VLSYS_CHECK_KIND_NETMASK;
     }
     return 0;
 }
 
-static int set_broadcast(vlsys_ifconf &nif, uint32_t broadcast) {
-    sockaddr_in sa = {};
-    sa.sin_family = AF_INET;
-    sa.sin_addr.s_addr = htonl(broadcast);
-    return addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof(sa), nif.broadaddr,
-                        sizeof(nif.broadaddr), "broadaddr");
-}
-
-int check_static_ipv4(Validator validator, vlsys_ifconf &nif, int position, Subnet4 &subnet,
-                      int &conversion) {
+int check_static_ipv4(Validator validator, vlsys_ifconf *nif, int position, Subnet4 *subnet) {
     const int fieldcode = field_code(VLSYS_CHECK_FIELD_IPV4_ADDR, position);
     sockaddr_in sa = {};
-    if (const int error = check_ipv4_text(&sa, nif.addr, sizeof(nif.addr), fieldcode))
+    if (const int error = check_ipv4_text(&sa, nif->addr, sizeof nif->addr, fieldcode))
         return error;
     uint32_t mask = 0;
-    if (const int error = check_netmask(validator, nif, position, mask))
+    if (const int error = check_netmask(validator, nif, position, &mask))
         return error;
-    subnet = Subnet4(host_order(sa), mask);
-    if (const int fault = check_not_reserved(subnet, subnet.address, "IP", nif.addr, fieldcode))
-        return fault;
-    conversion = set_broadcast(nif, subnet.broadcast);
-    return 0;
+    *subnet = Subnet4(host_order(sa), mask);
+    return check_not_reserved(*subnet, subnet->address, "IP", nif->addr, fieldcode);
 }
 
-int check_static_ipv6(vlsys_ifconf &nif, int position, Subnet6 &subnet) {
-    vlsys_addr6 &own = nif.addr6[0];
+int set_broadcast(vlsys_ifconf *nif, const Subnet4 &subnet) {
+    sockaddr_in sa = {};
+    sa.sin_family = AF_INET;
+    sa.sin_addr.s_addr = htonl(subnet.broadcast);
+    return addr_to_text(reinterpret_cast<const sockaddr *>(&sa), sizeof sa, nif->broadaddr,
+                        sizeof nif->broadaddr, "broadaddr");
+}
+
+int check_static_ipv6(vlsys_ifconf *nif, int position, Subnet6 *subnet) {
+    vlsys_addr6 *const own = &nif->addr6[0];
     const int fieldcode = field_code(VLSYS_CHECK_FIELD_IPV6_ADDR, position);
     sockaddr_in6 sa = {};
-    if (const int error = check_ipv6_text(&sa, own.addr, fieldcode))
+    if (const int error = check_ipv6_text(&sa, own->addr, fieldcode))
         return error;
-    if (own.prefix > 128)
+    if (own->prefix > 128)
         return field_code(VLSYS_CHECK_FIELD_IPV6_PREFIX, position) | VLSYS_CHECK_KIND_PREFIX;
-    subnet = Subnet6(host_order(sa), own.prefix);
-    return check_not_reserved(subnet, subnet.address, "IPv6", own.addr, fieldcode);
+    *subnet = Subnet6(host_order(sa), own->prefix);
+    return check_not_reserved(*subnet, subnet->address, "IPv6", own->addr, fieldcode);
 }
 
-DnsServer::DnsServer(vlsys_dns &dns, int index)
-    : text(dns.server[index]), fieldcode(field_code(VLSYS_CHECK_FIELD_DNS_PRIMARY + index)) {
-    snprintf(label, sizeof(label), "DNS server[%d]", index);
+DnsServer::DnsServer(vlsys_dns *dns, int index)
+    : text(dns->server[index]), field(VLSYS_CHECK_FIELD_DNS_PRIMARY + index),
+      fieldcode(field_code(field)) {
+    snprintf(label, sizeof label, "DNS server[%d]", index);
 }
 
 bool DnsServer::is_ipv6() const {

@@ -26,19 +26,21 @@ int check_not_reserved(const Subnet4 &subnet, uint32_t address, const char *labe
 int check_not_reserved(const Subnet6 &subnet, const Address6 &address, const char *label,
                        const char *text, int fieldcode);
 
-// The fixed addressing of one interface: normalizes address and netmask, fills the broadcast
-// address. `conversion` receives the result of the latter's conversion, which is no fault.
-int check_static_ipv4(Validator validator, vlsys_ifconf &nif, int position, Subnet4 &subnet,
-                      int &conversion);
-int check_static_ipv6(vlsys_ifconf &nif, int position, Subnet6 &subnet);
+// The fixed addressing of one interface: brings address and netmask into form and makes the subnet.
+int check_static_ipv4(Validator validator, vlsys_ifconf *nif, int position, Subnet4 *subnet);
+int check_static_ipv6(vlsys_ifconf *nif, int position, Subnet6 *subnet);
+
+// Fills broadaddr. Returns the result of its conversion, which is no fault and has been logged.
+int set_broadcast(vlsys_ifconf *nif, const Subnet4 &subnet);
 
 // One server of a DNS record, as the rules and messages name it.
 struct DnsServer {
-    DnsServer(vlsys_dns &dns, int index);
+    DnsServer(vlsys_dns *dns, int index);
     bool is_ipv6() const;
 
     char (&text)[VLSYS_ADDR6_SIZE];
-    int fieldcode; // the third server has that of the IPv6 address
+    int field; // the third server has that of the IPv6 address
+    int fieldcode;
     char label[16];
 };
 

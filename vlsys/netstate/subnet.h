@@ -16,6 +16,7 @@ struct Subnet4 {
           network(own_address & own_mask) {}
 
     bool is_set() const { return mask != 0; }
+    // A subnet contains its own network and broadcast address, too.
     bool contains(uint32_t other) const { return (other & mask) == network; }
     // A subnet of one address has neither a network nor a broadcast address.
     bool is_network(uint32_t other) const { return mask != UINT32_MAX && other == network; }
@@ -54,12 +55,10 @@ struct Subnet6 {
     Address6 network;
 
   private:
-    static uint64_t leading_ones(uint32_t count) {
-        return count == 0 ? 0 : UINT64_MAX << (64 - count);
-    }
+    static uint64_t half_mask(uint32_t ones) { return ones == 0 ? 0 : UINT64_MAX << (64 - ones); }
     static Address6 prefix_mask(uint32_t prefix) {
-        return prefix > 64 ? Address6{UINT64_MAX, leading_ones(prefix - 64)}
-                           : Address6{leading_ones(prefix), 0};
+        return prefix > 64 ? Address6{UINT64_MAX, half_mask(prefix - 64)}
+                           : Address6{half_mask(prefix), 0};
     }
 };
 
@@ -69,7 +68,7 @@ inline uint32_t host_order(const sockaddr_in &sa) {
 
 inline Address6 host_order(const sockaddr_in6 &sa) {
     uint64_t words[2];
-    memcpy(words, &sa.sin6_addr, sizeof(words));
+    memcpy(words, &sa.sin6_addr, sizeof words);
     return {be64toh(words[0]), be64toh(words[1])};
 }
 
