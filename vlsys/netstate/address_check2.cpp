@@ -187,7 +187,7 @@ static int check_learnt_gateway(const Network &network, uint32_t vlsys_ifconf::*
     if (iface[0] == '\0')
         return fieldcode | VLSYS_CHECK_KIND_INVALID;
     for (const vlsys_ifconf &nif : network.nifs)
-        if (strncmp(nif.name, iface, sizeof(nif.name)) == 0 && nif.*mode <= VLSYS_MODE_MANUAL)
+        if (strncmp(nif.name, iface, sizeof nif.name) == 0 && nif.*mode <= VLSYS_MODE_MANUAL)
             return fieldcode | VLSYS_CHECK_KIND_MODE;
     return 0;
 }

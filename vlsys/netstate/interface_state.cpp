@@ -37,12 +37,12 @@ static uint8_t prefix_length(const uint8_t (&mask)[Size]) {
     return length;
 }
 
-static void read_link(const ifaddrs &entry, vlsys_ifconf &nif) {
+static void read_link(const ifaddrs &entry, vlsys_ifconf *nif) {
     const auto *const link = reinterpret_cast<const sockaddr_ll *>(entry.ifa_addr);
     const auto *const mac = link->sll_addr;
-    snprintf(nif.mac, sizeof nif.mac, "%02X-%02X-%02X-%02X-%02X-%02X", mac[0], mac[1], mac[2],
+    snprintf(nif->mac, sizeof nif->mac, "%02X-%02X-%02X-%02X-%02X-%02X", mac[0], mac[1], mac[2],
              mac[3], mac[4], mac[5]);
-    nif.lower_up = (entry.ifa_flags & iff_lower_up) != 0;
+    nif->lower_up = (entry.ifa_flags & iff_lower_up) != 0;
 }
 
 template <size_t Size>
@@ -50,23 +50,23 @@ static int ipv4_text(const sockaddr *addr, char (&text)[Size], const char *label
     return addr_to_text(addr, sizeof(sockaddr_in), text, Size, label);
 }
 
-static int read_ipv4(const ifaddrs &entry, vlsys_ifconf &nif) {
-    nif.up = (entry.ifa_flags & IFF_UP) != 0;
-    int result = ipv4_text(entry.ifa_addr, nif.addr, "addr");
+static int read_ipv4(const ifaddrs &entry, vlsys_ifconf *nif) {
+    nif->up = (entry.ifa_flags & IFF_UP) != 0;
+    int result = ipv4_text(entry.ifa_addr, nif->addr, "addr");
     if (result == 0 && (entry.ifa_flags & IFF_BROADCAST) != 0)
-        result = ipv4_text(entry.ifa_broadaddr, nif.broadaddr, "broadaddr");
+        result = ipv4_text(entry.ifa_broadaddr, nif->broadaddr, "broadaddr");
     if (result == 0)
-        result = ipv4_text(entry.ifa_netmask, nif.netmask, "netmask");
+        result = ipv4_text(entry.ifa_netmask, nif->netmask, "netmask");
     if (result != 0)
         return result;
     uint8_t mask[sizeof(in_addr)];
     memcpy(mask, &reinterpret_cast<const sockaddr_in *>(entry.ifa_netmask)->sin_addr, sizeof mask);
-    nif.prefix = prefix_length(mask);
+    nif->prefix = prefix_length(mask);
     return 0;
 }
 
 // Where an address goes in the record, with its scope.
-static vlsys_addr6 &choose_slot(const in6_addr &address, vlsys_ifconf &nif) {
+static vlsys_addr6 *choose_slot(const in6_addr &address, vlsys_ifconf *nif) {
     int slot = 3;
     const char *scope = "global";
     if (IN6_IS_ADDR_LINKLOCAL(&address)) {
@@ -75,29 +75,29 @@ static vlsys_addr6 &choose_slot(const in6_addr &address, vlsys_ifconf &nif) {
     } else if (IN6_IS_ADDR_SITELOCAL(&address)) {
         slot = 0;
         scope = "site";
-    } else if (nif.addr6[0].addr[0] == '\0') {
+    } else if (nif->addr6[0].addr[0] == '\0') {
         slot = 0;
-    } else if (nif.addr6[2].addr[0] == '\0') {
+    } else if (nif->addr6[2].addr[0] == '\0') {
         slot = 2;
     }
-    vlsys_strlcpy(nif.addr6[slot].scope, scope, sizeof nif.addr6[slot].scope);
-    return nif.addr6[slot];
+    vlsys_strlcpy(nif->addr6[slot].scope, scope, VLSYS_SCOPE_SIZE);
+    return &nif->addr6[slot];
 }
 
-static int read_ipv6(const ifaddrs &entry, vlsys_ifconf &nif) {
+static int read_ipv6(const ifaddrs &entry, vlsys_ifconf *nif) {
     const auto *const address = reinterpret_cast<const sockaddr_in6 *>(entry.ifa_addr);
-    vlsys_addr6 &slot = choose_slot(address->sin6_addr, nif);
+    vlsys_addr6 *const slot = choose_slot(address->sin6_addr, nif);
     const int result =
-        addr_to_text(entry.ifa_addr, sizeof *address, slot.addr, sizeof slot.addr, "v6addr");
+        addr_to_text(entry.ifa_addr, sizeof *address, slot->addr, sizeof slot->addr, "v6addr");
     if (result != 0)
         return result;
     const auto *const mask = reinterpret_cast<const sockaddr_in6 *>(entry.ifa_netmask);
-    slot.prefix = prefix_length(mask->sin6_addr.s6_addr);
-    nif.has_ipv6 = 1;
+    slot->prefix = prefix_length(mask->sin6_addr.s6_addr);
+    nif->has_ipv6 = 1;
     return 0;
 }
 
-static int read_entry(const ifaddrs &entry, vlsys_ifconf &nif) {
+static int read_entry(const ifaddrs &entry, vlsys_ifconf *nif) {
     switch (entry.ifa_addr->sa_family) {
     case AF_PACKET:
         read_link(entry, nif);
@@ -113,7 +113,7 @@ static int read_entry(const ifaddrs &entry, vlsys_ifconf &nif) {
 
 // The entries of the interface, told by the beginning of their names: those of eth0:1 belong to
 // eth0, and those of eth10 to eth1. `seen` tells whether there was one.
-static int read_entries(const ifaddrs *entries, const char *ifname, vlsys_ifconf &nif, bool *seen) {
+static int read_entries(const ifaddrs *entries, const char *ifname, vlsys_ifconf *nif, bool *seen) {
     const size_t length = strlen(ifname);
     for (const ifaddrs *entry = entries; entry; entry = entry->ifa_next) {
         if (!entry->ifa_addr || strncmp(entry->ifa_name, ifname, length) != 0)
@@ -138,17 +138,15 @@ int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif) {
     if (missing != 0)
         return -missing;
     ifaddrs *list = nullptr;
-    if (getifaddrs(&list) != 0) {
-        vlsys_log(LOG_ERR, "%s: %m", "getifaddrs");
-        return errno;
-    }
+    if (getifaddrs(&list) != 0)
+        return -log_errno("%s", "getifaddrs");
     const Entries entries(list);
 
     nif->up = 0;
     nif->has_ipv6 = 0;
     memset(nif->addr6, 0, sizeof nif->addr6);
     bool seen = false;
-    const int result = read_entries(entries.get(), ifname, *nif, &seen);
+    const int result = read_entries(entries.get(), ifname, nif, &seen);
     if (result != 0)
         return result;
     if (seen) {

@@ -44,17 +44,17 @@ void Line::append(const char *format, ...) {
         length_ = std::min(length_ + static_cast<size_t>(length), sizeof text_ - 1);
 }
 
-static void query(const char *name, int exit_code, vlsys_ifconf &nif) {
+static void query(const char *name, int exit_code, vlsys_ifconf *nif) {
     for (int tries = 1; tries <= ipv6_tries; tries++) {
-        nif = {};
+        *nif = {};
         vlsys_log(LOG_DEBUG, "q: %s", name);
-        const int result = vlsys_get_netif(name, &nif);
+        const int result = vlsys_get_netif(name, nif);
         if (result != 0) {
             vlsys_log(LOG_ERR, "vlsys_get_netif(%s): %s", name,
                       result < 0 ? gai_strerror(result) : strerror(result));
             return;
         }
-        if (exit_code != 0 || nif.ipv6_mode == VLSYS_MODE_OFF || nif.has_ipv6)
+        if (exit_code != 0 || nif->ipv6_mode == VLSYS_MODE_OFF || nif->has_ipv6)
             return;
         wait_seconds(1);
         vlsys_log(LOG_DEBUG, "%s: retry vlsys_get_netif(%s) %d times", "print_network_info", name,
@@ -75,40 +75,40 @@ static void report_link(const char *name, const vlsys_ifconf &nif) {
     line.log();
 }
 
-static void append_address(Line &line, const char *addr, uint32_t prefix) {
-    line.append("%s%s/%u", line.is_empty() ? "" : ", ", addr, prefix);
+static void append_address(Line *line, const char *addr, uint32_t prefix) {
+    line->append("%s%s/%u", line->is_empty() ? "" : ", ", addr, prefix);
 }
 
 // No line for an interface without an address in force.
 static void report_addresses(const vlsys_ifconf &nif) {
     Line line;
     if (nif.up)
-        append_address(line, nif.addr, nif.prefix);
+        append_address(&line, nif.addr, nif.prefix);
     for (const vlsys_addr6 &addr6 : nif.addr6)
         if (nif.has_ipv6 && addr6.addr[0] != '\0')
-            append_address(line, addr6.addr, addr6.prefix);
+            append_address(&line, addr6.addr, addr6.prefix);
     if (!line.is_empty())
         line.log();
 }
 
-static void append_gateway(Line &line, std::span<const char *const> modes, uint32_t mode,
+static void append_gateway(Line *line, std::span<const char *const> modes, uint32_t mode,
                            const char *addr, const char *iface) {
     if (mode == VLSYS_MODE_OFF) {
-        line.append("[off]");
+        line->append("[off]");
         return;
     }
     char number[11];
     snprintf(number, sizeof number, "%u", mode);
-    line.append("%s (%s) [%.7s]", addr, iface, mode < modes.size() ? modes[mode] : number);
+    line->append("%s (%s) [%.7s]", addr, iface, mode < modes.size() ? modes[mode] : number);
 }
 
 static void report_gateways(const vlsys_gw4 &gw4, const vlsys_gw6 &gw6) {
     const std::span<const char *const> modes(gateway_modes);
     Line line;
     line.append("gw4 ");
-    append_gateway(line, modes.first(3), gw4.mode, gw4.addr, gw4.iface);
+    append_gateway(&line, modes.first(3), gw4.mode, gw4.addr, gw4.iface);
     line.append(", gw6 ");
-    append_gateway(line, modes, gw6.mode, gw6.addr, gw6.iface);
+    append_gateway(&line, modes, gw6.mode, gw6.addr, gw6.iface);
     line.log();
 }
 
@@ -131,7 +131,7 @@ void print_network_info(int exit_code) {
                           static_cast<size_t>(std::min(interfaces.count(), shown_interfaces)));
     vlsys_ifconf nifs[shown_interfaces] = {};
     for (size_t i = 0; i < shown.size(); i++)
-        query(shown[i], exit_code, nifs[i]);
+        query(shown[i], exit_code, &nifs[i]);
 
     vlsys_gw4 gw4 = {};
     vlsys_gw6 gw6 = {};
