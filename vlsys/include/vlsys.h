@@ -467,6 +467,9 @@ VLSYS_API int vlsys_set_hostname_immediately(const char *name);
  * - addr6: a link-local address goes to entry 1, a site-local one to entry 0. Any other goes to
  *   the first of the entries 0, 2 and 3 that is empty, or else replaces entry 3.
  * - An interface is told by the beginning of its addresses' names: "eth1" shows those of eth10 too.
+ * - The interface's file is read by its letters, not as a shell reads it: a value in single quotes,
+ *   with a blank or with a comment behind it is another value. ONBOOT='yes' thus reads as IPv4 Off,
+ *   BOOTPROTO='none' as DHCP. Double quotes around a value are understood.
  * - up, has_ipv6 and addr6 are cleared first; the other fields of what the interface does not have
  *   stay as they are, so give a record of zeros.
  *
@@ -474,8 +477,9 @@ VLSYS_API int vlsys_set_hostname_immediately(const char *name);
  * alternative name is none), both silent and with nothing written; the errno value of a look-up
  * that failed otherwise, such as 24 (EMFILE) without a free descriptor, with nothing written; the
  * errno value of getifaddrs; the errno value or negative resolver code of an address that could not
- * be converted, with the fields up to it filled, but not name, index and the modes; the positive errno of an interface file that cannot be read, with all
- * filled but ipv4_mode. An interface that vanishes meanwhile leaves name and index unwritten.
+ * be converted, with the fields up to it filled, but not name, index and the modes; the positive
+ * errno of an interface file that cannot be read, with all filled but ipv4_mode. An interface that
+ * vanishes meanwhile leaves name and index unwritten.
  * Reads the kernel's list once; waits 11 seconds for a switch file that is missing.
  */
 VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
@@ -483,9 +487,10 @@ VLSYS_API int vlsys_get_netif(const char *ifname, vlsys_ifconf *nif);
 /*
  * Reads the IPv6 default gateway in force: the first route to :: in /proc/net/ipv6_route that is up
  * and has a gateway. `addr` is its address, with "%interface" when it is link-local, and `iface`
- * its interface. The mode goes by the kernel's count of references to the route: Manual for exactly
- * one, else Auto. (Recent kernels count one for a learnt route too, and one more for a use.)
- * Without such a route the record is all empty (Off).
+ * its interface. Without such a route the record is all empty (Off). Both facts are the kernel's
+ * alone: a route stays up when its link loses carrier, and whether it was learnt goes by the count
+ * of references to it, Manual for exactly one, else Auto. (Recent kernels count one for a learnt
+ * route too, and one more for a use.)
  *
  * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the
  * table when it cannot be opened, with the record as it was, or when it cannot be read, with the
@@ -496,10 +501,11 @@ VLSYS_API int vlsys_get_ipv6_default_gateway2(vlsys_gw6 *gw);
 
 /*
  * Reads the IPv4 default gateway in force, and how it is configured. `addr` and `iface` are those
- * of the first route to 0.0.0.0/0 in /proc/net/route ("0.0.0.0" for a route without a gateway),
- * empty when there is none. The mode is Manual when <root>/etc/sysconfig/network has a line that
- * begins with "GATEWAY="; else DHCP when <root>/etc/sysconfig/network-scripts/ifcfg-<name> of some
- * interface has a line that begins with "BOOTPROTO=dhcp" and none with "DEFROUTE=no"; else Off.
+ * of the first route to 0.0.0.0/0 in /proc/net/route, empty when there is none; "0.0.0.0" is a
+ * route without a gateway, on the interface "*" one that rejects ("unreachable"). The mode is
+ * Manual when <root>/etc/sysconfig/network has a line that begins with "GATEWAY="; else DHCP when
+ * <root>/etc/sysconfig/network-scripts/ifcfg-<name> of some interface has a line that begins with
+ * "BOOTPROTO=dhcp" and none with "DEFROUTE=no"; else Off.
  *
  * Returns 0, also without a route; 14 (EFAULT) for a null record (silent); the errno value of the
  * table when it cannot be opened, with the record as it was; the errno value of another file that
@@ -520,15 +526,16 @@ VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
 
 /*
  * Puts into force what the setters wrote, and logs the state that comes of it. In this order: sets
- * the running host name to the HOSTNAME of /etc/sysconfig/network (empty when there is none, or when
- * the file cannot be opened, which is logged); makes sure that vlsys_get_dns_settings can read; removes /etc/resolv.conf, which the
- * network scripts write anew; runs "service network restart" with vlsys_system; reports.
+ * the running host name to the HOSTNAME of /etc/sysconfig/network (empty when there is none, or
+ * when the file cannot be opened, which is logged); makes sure that vlsys_get_dns_settings can
+ * read; removes /etc/resolv.conf, which the network scripts write anew; runs "service network
+ * restart" with vlsys_system; reports.
  *
  * Returns
  *   the exit code of the restart command, 0 to 255, or 256 when it did not exit normally;
  *   a positive errno when the DNS settings cannot be read, with only the host name set;
- *   the negated errno when that file opens and cannot be read, with nothing done, or when the host
- *   name cannot be set, with nothing else done;
+ *   the negated errno when /etc/sysconfig/network opens and cannot be read, or the host name cannot
+ *   be set, with nothing done;
  *   a negative result of vlsys_system when the restart command could not be run, with no report.
  * A negated errno of 1 (EPERM) is also -1; a positive errno is told from an exit code by the log.
  * Failures in the report are logged and change nothing; nor does /etc/resolv.conf that cannot be
@@ -549,8 +556,10 @@ VLSYS_API int vlsys_get_ipv4_default_gateway(char *text);
  * when there are none either. A gateway's mode is "static", "dhcp", "auto" or "off".
  *
  * Blocks until the command has ended, and after exit code 0 up to 10 seconds more for each shown
- * interface that is set to IPv6 and has no IPv6 address yet (each second at LOG_DEBUG); each query
- * of an interface can block as long as vlsys_get_netif.
+ * interface that is set to IPv6 and has no IPv6 address yet (each second at LOG_DEBUG), whatever
+ * signals arrive; each query of an interface can block as long as vlsys_get_netif. Set to IPv6 is
+ * also an interface that is off while the kernel has IPv6 and autoconf on for it: it costs the 10
+ * seconds.
  */
 VLSYS_API int vlsys_network_restart(void);
 
@@ -849,6 +858,39 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 #define VLSYS_CHECK_KIND_MODE 11       /* a mode that another setting does not support */
 
 /*
+ * Which fields the validators read, and in which modes. In any other mode a field may hold any
+ * text, and a result of 0 says nothing about it.
+ *
+ *   field                   vlsys_address_check  vlsys_address_check2
+ *   interface: name         always               always
+ *     addr, netmask         IPv4 Manual          IPv4 Manual
+ *     prefix                never                IPv4 Manual
+ *     addr6[0]              IPv6 Manual          IPv6 Manual (addr and prefix)
+ *   IPv4 gateway: addr      IPv4 not Off         gateway Manual
+ *   IPv6 gateway: addr      IPv6 not Off         gateway Manual
+ *     iface                 (has none)           gateway DHCP, IPv6 also Auto
+ *   DNS: domain, server[0]  DNS Manual           DNS Manual
+ *     server[1]             DNS Manual           DNS Manual
+ *     server[2]             never                DNS Manual
+ *     iface                 never                never
+ *   host name               always               always
+ *
+ * Some of them reach the setters unread, and are written as they are into files that the network
+ * scripts run as shell text:
+ * - GATEWAY and IPV6_DEFAULTGW: the gateway's addr, after vlsys_address_check with its family Off,
+ *   after vlsys_address_check2 with the gateway's mode DHCP, IPv6 also Auto (a gateway record that
+ *   is Off or of an unknown mode is cleared);
+ * - DOMAIN, DNS1 and DNS2: domain, server[0] and server[1], with a DNS mode above VLSYS_MODE_DHCP,
+ *   which passes both validators and is Manual to the setter (vlsys_address_check turns it Off when
+ *   both families are Off, vlsys_address_check2 refuses it when no interface is on).
+ * IPv4 modes above VLSYS_MODE_DHCP and IPv6 modes above VLSYS_MODE_AUTO pass as well; the setter
+ * takes them for DHCP and Auto, and writes no field that was not read.
+ *
+ * So a setting that comes from outside goes by way of vlsys_set_network, which clears them, and not
+ * from a validator straight to the setters.
+ */
+
+/*
  * Checks whether the network setting of one interface can be applied, and brings it into the form
  * that the setters write. The checks stop at the first fault, in the order given here; what was
  * brought into form up to there stays so. The texts are those of the records' fields, where one
@@ -857,9 +899,11 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  *
  * - The kernel has an interface of that very name; an alternative name is none.
  * - IPv4 Manual: addr, netmask (a prefix length of 8 to 30 becomes a mask) and the gateway become
- *   canonical, broadaddr is filled. The gateway lies in the subnet; neither it nor addr is the
- *   network or broadcast address, which a netmask of 255.255.255.255 does not have. IPv4 DHCP: the
- *   gateway becomes canonical. IPv4 Off: it is not looked at.
+ *   canonical, broadaddr is filled. A netmask is a prefix length by the number it begins with:
+ *   "24abc" and "24.0.0.0" are 24 as well. "31" is none: it is the mask 0.0.0.31, which has a gap.
+ *   The gateway lies in the subnet; neither it nor addr is the network or broadcast address, which
+ *   a netmask of 255.255.255.255 does not have. IPv4 DHCP: the gateway becomes canonical. IPv4 Off:
+ *   it is not looked at.
  * - IPv6 the same, with addr6[0]: a link-local gateway needs no subnet but its "%interface", and
  *   there is no broadcast address.
  * - DNS is turned Off, with a warning, when both families are Off, or when it is DHCP and neither
@@ -875,16 +919,15 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * - The host name is well-formed and at most 64 characters long; an empty one becomes "localhost",
  *   with a warning.
  *
- * Returns 0, a check code at position 0, EFAULT for a null argument, the errno value of a look-up of
- * the interface that failed for a reason of its own (EMFILE without a free descriptor), or the
- * errno value or negative resolver code of a failed address conversion; that of broadaddr alone
- * does not stop the checks.
- * Logs the modes at LOG_INFO at the start and when all is well, and each fault at LOG_ERR. Silent:
- * null arguments, an interface that does not exist, an IPv6 prefix length above 128, an address of
- * a range that its field does not allow, a link-local address without scope, a name with a
- * misplaced character (one that is too long is logged) and a missing server[0]. A netmask made of
- * a prefix length is logged at LOG_DEBUG.
- * Asks the kernel for interface names only; no host name is looked up, nothing is waited for.
+ * Returns 0, a check code at position 0, EFAULT for a null argument, the errno value of an
+ * interface look-up that failed for another reason (EMFILE: no free descriptor), or the errno value
+ * or negative resolver code of a failed address conversion; that of broadaddr alone does not stop
+ * the checks. Logs the modes at LOG_INFO at the start and when all is well, and each fault at
+ * LOG_ERR. Silent: null arguments, an interface that does not exist, an IPv6 prefix length above
+ * 128, an address of a range that its field does not allow, a link-local address without scope, a
+ * name with a misplaced character (one that is too long is logged) and a missing server[0]. A
+ * netmask made of a prefix length is logged at LOG_DEBUG. Asks the kernel for interface names only;
+ * no host name is looked up, nothing is waited for.
  */
 VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys_dns *dns,
                                   char *hostname);
@@ -893,8 +936,8 @@ VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys
  * Checks the network setting of `count` interfaces at once, in the manner of vlsys_address_check;
  * what differs:
  *
- * - Interfaces: "eth1" need not exist, nor is it looked up, and "lo" is refused. A prefix of 8 to 30 replaces the
- *   netmask; otherwise it becomes the netmask's length, which must be 8 to 30.
+ * - Interfaces: "eth1" need not exist, nor is it looked up, and "lo" is refused. A prefix of 8 to
+ *   30 replaces the netmask; otherwise it becomes the netmask's length, which must be 8 to 30.
  * - No two interfaces have the same IPv4 address, and none has a Manual address in the subnet of
  *   another one, in either family (in IPv6 silent).
  * - A Manual gateway needs an interface of its family that is on. It lies in the subnet of any
@@ -907,9 +950,10 @@ VLSYS_API int vlsys_address_check(vlsys_ifconf *nif, char *gw4, char *gw6, vlsys
  * - A DNS mode other than Off without an interface that is on, and DHCP without one on DHCP, are
  *   faults.
  * - DNS Manual: of equal servers the last one stays, the others are emptied; at least one of the
- *   three is given. A server needs an interface of its family that is on, and lies in the subnet of
- *   any Manual interface, or one learns its routes, or the Manual gateway of its family was
- *   accepted; it is no subnet's network or broadcast address.
+ *   three is given. (vlsys_set_dns_settings writes the first two and refuses an empty server[0].) A
+ *   server needs an interface of its family that is on, and lies in the subnet of any Manual
+ *   interface, or one learns its routes, or the Manual gateway of its family was accepted; it is no
+ *   subnet's network or broadcast address.
  * - dns->iface becomes the first interface that is on (DNS Manual) or on DHCP (DNS DHCP), and stays
  *   as it is otherwise.
  *
