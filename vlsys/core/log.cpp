@@ -4,8 +4,6 @@
 
 #include <cstring>
 
-#undef vlsys_log
-
 namespace vlsys {
 
 static const char *log_ident;    // null until the log is opened

@@ -14,6 +14,3 @@ namespace vlsys {
 [[gnu::format(printf, 1, 2)]] int log_errno(const char *format, ...);
 
 } // namespace vlsys
-
-// GCC's -Wpedantic refuses "%m", which this library's messages live on; the arguments stay checked.
-#define vlsys_log(...) __extension__ vlsys_log(__VA_ARGS__)

@@ -42,9 +42,11 @@ static int make_directory_of(const char *path) {
     if (!directory)
         return -errno;
     char *const slash = strrchr(directory.get(), '/');
-    if (!slash)
+    if (!slash || slash == directory.get())
         return 0;
     *slash = '\0';
+    if (access(directory.get(), F_OK) == 0)
+        return 0; // vlsys_mkdir would try every level
     if (vlsys_mkdir(directory.get(), 0755) != 0 && errno != EEXIST)
         return log_errno("%s: vlsys_mkdir(%s, 0755)", "edit", directory.get());
     return 0;

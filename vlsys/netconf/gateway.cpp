@@ -5,30 +5,8 @@
 #include "netconf/keys.h"
 
 #include <cstring>
-#include <iterator>
 
 namespace vlsys {
-
-namespace {
-
-struct NoTexts {};
-
-// Whether an interface may have a default route of its own.
-enum class RouteColumn : uint8_t { allowed, refused };
-
-} // namespace
-
-using enum Action;
-
-// clang-format off
-static constexpr KeyRow<NoTexts, 2> route_keys[] = {
-    // default route  allowed  refused
-    {"DEFROUTE",     {removed, "no"}},
-    {"METRIC",       {removed, removed}},
-    {"GATEWAY",      {removed, removed}},
-    {"GATEWAYDEV",   {removed, removed}},
-};
-// clang-format on
 
 static int write_gateway(const char *key, const char *address) {
     edit_item array[1];
@@ -40,12 +18,12 @@ static int write_gateway(const char *key, const char *address) {
     return edit_or_log(SystemPath(network_path).text, list.items());
 }
 
-// The record is a vlsys_gw4 or vlsys_gw6.
+// Whether the interface may have a default route of its own. The record is a vlsys_gw4 or
+// vlsys_gw6.
 template <class Gateway>
-static RouteColumn column_of(const char *name, const Gateway &gw) {
-    const bool allowed = gw.mode == VLSYS_MODE_MANUAL || gw.addr[0] != '\0' ||
-                         strncmp(name, gw.iface, sizeof gw.iface) == 0;
-    return allowed ? RouteColumn::allowed : RouteColumn::refused;
+static bool has_default_route(const char *name, const Gateway &gw) {
+    return gw.mode == VLSYS_MODE_MANUAL || gw.addr[0] != '\0' ||
+           strncmp(name, gw.iface, sizeof gw.iface) == 0;
 }
 
 static void log_gateway4(const vlsys_gw4 &gw, const char *address) {
@@ -57,14 +35,18 @@ static void log_gateway4(const vlsys_gw4 &gw, const char *address) {
         vlsys_log(LOG_INFO, "IPv4 GW dhcp");
 }
 
-static int set_route_keys(const char *name, RouteColumn column) {
-    if (column == RouteColumn::allowed)
-        vlsys_log(LOG_DEBUG, "%s: delete DEFROUTE", name);
-    else
-        vlsys_log(LOG_DEBUG, "%s: DEFROUTE=no", name);
-    edit_item array[std::size(route_keys)];
+static int set_route_keys(const char *name, bool default_route) {
+    edit_item array[4];
     ItemList list(array);
-    list.add_column(route_keys, column, {});
+    if (default_route) {
+        vlsys_log(LOG_DEBUG, "%s: delete DEFROUTE", name);
+        list.remove("DEFROUTE");
+    } else {
+        vlsys_log(LOG_DEBUG, "%s: DEFROUTE=no", name);
+        list.set("DEFROUTE", "no");
+    }
+    for (const char *key : {"METRIC", "GATEWAY", "GATEWAYDEV"})
+        list.remove(key);
     return edit_or_log(SystemPath(ifcfg_prefix, name).text, list.items());
 }
 
@@ -75,7 +57,7 @@ static int set_gateway4(const vlsys_gw4 &gw) {
     if (result != 0)
         return result;
     for (const auto &name : InterfaceList()) {
-        result = set_route_keys(name, column_of(name, gw));
+        result = set_route_keys(name, has_default_route(name, gw));
         if (result != 0)
             return result;
     }
@@ -94,9 +76,9 @@ static void log_gateway6(const vlsys_gw6 &gw, const char *address) {
 }
 
 // The switch says whether an interface takes a default route from router advertisements.
-static void set_route_switch(const char *name, RouteColumn column, const char *key,
+static void set_route_switch(const char *name, bool default_route, const char *key,
                              ItemList *list) {
-    if (column == RouteColumn::allowed) {
+    if (default_route) {
         vlsys_log(LOG_INFO, "IPv6 GW auto (%s)", name);
         vlsys_log(LOG_DEBUG, "%s 1", key);
         list->set(key, " 1");
@@ -120,7 +102,7 @@ static int write_route_switches(const vlsys_gw6 &gw) {
     SwitchKey *key = keys.get();
     for (const auto &name : interfaces) {
         *key = switch_key(name, "accept_ra_defrtr");
-        set_route_switch(name, column_of(name, gw), key->text, &list);
+        set_route_switch(name, has_default_route(name, gw), key->text, &list);
         ++key;
     }
     return edit_or_log(SystemPath(sysctl_path).text, list.items());

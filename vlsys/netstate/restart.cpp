@@ -50,7 +50,8 @@ static int set_running_hostname() {
 
 static void remove_resolver_file() {
     if (unlink(resolv_path) != 0 && errno != ENOENT)
-        vlsys_log(LOG_WARNING, "%s: unlink(%s): %m", "vlsys_network_restart", resolv_path);
+        vlsys_log(LOG_WARNING, "%s: unlink(%s): %s", "vlsys_network_restart", resolv_path,
+                  strerror(errno));
 }
 
 static void report(int exit_code) {
