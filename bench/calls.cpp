@@ -62,8 +62,8 @@ void edit(State &state, uint32_t lines, uint32_t count) {
 // The system calls of such an edit, and nothing else. Where the edit makes a call more, it belongs
 // here too: `scripts/bench edit` says which calls differ.
 bool replace(const std::string &content) {
-    for (const char *const directory : directories)
-        mkdir(directory, 0755);
+    if (access(std::end(directories)[-1], F_OK) != 0)
+        return false;
     std::string temporary = std::string(path) + "-XXXXXX";
     const mode_t mask = umask(077);
     const int made = mkostemp(temporary.data(), O_CLOEXEC);
