@@ -1,0 +1,14 @@
+// With the C++ library's assertions on, a failed one calls a function of libstdc++, which nothing
+// here is linked with.
+#include <cstddef>
+#include <cstdlib>
+
+#if defined(_GLIBCXX_ASSERTIONS) && defined(_GLIBCXX_VERBOSE_ASSERT)
+
+// Weak: a program that is linked with the static library may bring its own.
+[[gnu::weak]] void std::__glibcxx_assert_fail(const char *, int, const char *,
+                                              const char *) noexcept {
+    abort();
+}
+
+#endif
