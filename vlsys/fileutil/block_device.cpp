@@ -64,7 +64,8 @@ int64_t vlsys_get_block_device_size(const char *path) {
 
     char file[VLSYS_PATH_SIZE + sizeof block_path + sizeof "/sda//size"];
     if (is_partition(name.get()))
-        snprintf(file, sizeof file, "%s/%.3s/%s/size", block_path, name.get(), name.get());
+        snprintf(file, sizeof file, "%s/%.3s/%.*s/size", block_path, name.get(), VLSYS_PATH_SIZE,
+                 name.get());
     else
         snprintf(file, sizeof file, "%s/%s/size", block_path, name.get());
     return read_block_size_file(file);
