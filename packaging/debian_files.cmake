@@ -1,9 +1,10 @@
 # What Debian wants in each package besides what is installed: gzipped manual pages, change logs.
 function(gzip file)
   execute_process(COMMAND gzip -9n ${file} COMMAND_ERROR_IS_FATAL ANY)
+  file(CHMOD ${file}.gz PERMISSIONS OWNER_READ OWNER_WRITE GROUP_READ WORLD_READ)
 endfunction()
 
-file(GLOB_RECURSE pages ${CPACK_TEMPORARY_INSTALL_DIRECTORY}/*/share/man/*)
+file(GLOB_RECURSE pages ${CPACK_TEMPORARY_INSTALL_DIRECTORY}/*/usr/share/man/*)
 foreach(page ${pages})
   gzip(${page})
 endforeach()
