@@ -64,7 +64,7 @@ TEST_F(Device, WaitReportsWhatCameUp) {
     };
     for (const auto &[status, sleeps, result, log_end] : cases) {
         set_status(status);
-        fail_nanosleep(60, sleeps == 60 ? EINTR : EINVAL);
+        fail_call("nanosleep", 60, sleeps == 60 ? EINTR : EINVAL);
         EXPECT_EQ(vlsys_avio_wait_ready(), result);
         EXPECT_EQ(take_waits(), std::vector<int64_t>(sleeps, 29970030));
         EXPECT_TRUE(take_log().ends_with(log_end)) << log_end;

@@ -9,11 +9,13 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <fts.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
 #include <numeric>
 #include <poll.h>
 #include <set>
+#include <sstream>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -23,9 +25,11 @@ namespace fs = std::filesystem;
 namespace test {
 
 std::string read_file(const std::string &path) {
-    std::ifstream file(path);
+    const std::ifstream file(path);
     EXPECT_TRUE(file) << "cannot read " << path;
-    return {std::istreambuf_iterator<char>(file), {}};
+    std::ostringstream text;
+    text << file.rdbuf();
+    return text.str();
 }
 
 void write_file(const std::string &path, const std::string &content) {
@@ -44,9 +48,82 @@ unsigned mode_of(const std::string &path) {
 }
 
 std::string link_target(const std::string &path) {
-    std::error_code error;
-    return fs::read_symlink(path, error);
+    char target[4096];
+    const ssize_t length = readlink(path.c_str(), target, sizeof target);
+    return {target, static_cast<size_t>(std::max<ssize_t>(length, 0))};
 }
+
+// ---- What changed
+
+static std::string describe(const fs::path &path) {
+    if (fs::is_symlink(path))
+        return "-> " + link_target(path) + "\n";
+    char mode[] = "mode 0000\n";
+    snprintf(mode, sizeof mode, "mode %04o\n", mode_of(path) & 07777);
+    return (mode_of(path) == 0644 ? "" : mode) + read_file(path);
+}
+
+Files unit_files(const std::string &directory) {
+    Files files;
+    std::string root = directory;
+    char *const roots[] = {root.data(), nullptr};
+    FTS *const walk = fts_open(roots, FTS_PHYSICAL | FTS_NOCHDIR, nullptr);
+    while (const FTSENT *entry = fts_read(walk)) {
+        const bool is_link = entry->fts_info == FTS_SL || entry->fts_info == FTS_SLNONE;
+        const bool is_machines = is_link && link_target(entry->fts_path).starts_with("/run/host/");
+        if ((is_link || entry->fts_info == FTS_F) && !is_machines)
+            files[entry->fts_path + root.size() + 1] = describe(entry->fts_path);
+    }
+    fts_close(walk);
+    return files;
+}
+
+static std::vector<std::string> split_lines(const std::string &text) {
+    std::istringstream stream(text);
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(stream, line);)
+        lines.push_back(line);
+    return lines;
+}
+
+static std::string key_of(const std::string &line) {
+    const std::string key = line.substr(0, line.find('='));
+    return key.substr(0, key.find_last_not_of(' ') + 1);
+}
+
+static std::string changed_lines(const std::string &before, const std::string &after) {
+    const std::vector<std::string> old_lines = split_lines(before);
+    const std::set<std::string> known(old_lines.begin(), old_lines.end());
+    std::set<std::string> keys;
+    std::string changed;
+    for (const auto &line : split_lines(after)) {
+        keys.insert(key_of(line));
+        if (!known.contains(line))
+            changed += "+" + line + "\n";
+    }
+    for (const auto &line : old_lines)
+        if (!line.empty() && line[0] != '#' && !keys.contains(key_of(line)))
+            changed += "-" + key_of(line) + "\n";
+    return changed;
+}
+
+std::string changes(const Files &before, const Files &after) {
+    Files all = before;
+    all.insert(after.begin(), after.end());
+    std::string changed;
+    for (const auto &[path, text] : all) {
+        const std::string name = fs::path(path).filename();
+        if (!after.contains(path))
+            changed += "-" + name + "\n";
+        else if (!before.contains(path))
+            changed += "+" + name + "\n" + changed_lines("", text);
+        else if (const auto lines = changed_lines(before.at(path), after.at(path)); !lines.empty())
+            changed += name + "\n" + lines;
+    }
+    return changed;
+}
+
+// ---- This process
 
 int open_descriptors() {
     return static_cast<int>(std::distance(fs::directory_iterator("/proc/self/fd"), {}));
@@ -95,44 +172,44 @@ std::vector<std::string> take_raw_log() {
     return std::exchange(log_datagrams, {});
 }
 
+static std::vector<unit::LogMessage> parse(const std::vector<std::string> &datagrams) {
+    std::vector<unit::LogMessage> messages;
+    for (const auto &datagram : datagrams) {
+        unit::LogMessage message = unit::parse_log_datagram(datagram);
+        EXPECT_EQ(message.priority & ~LOG_PRIMASK, LOG_LOCAL0) << datagram;
+        EXPECT_NE(message.text, datagram) << "has not the form of a message";
+        message.priority = LOG_PRI(message.priority);
+        messages.push_back(message);
+    }
+    return messages;
+}
+
 std::string take_log() {
     std::string log;
-    for (const auto &datagram : take_raw_log()) {
-        const unit::LogMessage message = unit::parse_log_datagram(datagram);
-        EXPECT_EQ(message.priority & ~7, LOG_LOCAL0) << datagram;
-        EXPECT_NE(message.text, datagram);
-        log += std::to_string(message.priority & 7) + " " + message.text + "\n";
-    }
+    for (const auto &message : parse(take_raw_log()))
+        log += std::to_string(message.priority) + " " + message.text + "\n";
     return log;
 }
 
-// ---- Waits
-
-static std::vector<int64_t> waits;
-static int nanosleep_failure_in;
-static int nanosleep_error;
-
-std::vector<int64_t> take_waits() {
-    return std::exchange(waits, {});
+std::string take_log(int priority) {
+    std::string log;
+    for (const auto &message : parse(take_raw_log()))
+        if (message.priority <= priority)
+            log += message.text + "\n";
+    return log;
 }
 
-void fail_nanosleep(int nth, int error) {
-    nanosleep_failure_in = nth;
-    nanosleep_error = error;
-}
-
-extern "C" unsigned int __wrap_sleep(unsigned int seconds) {
-    waits.push_back(seconds * INT64_C(1000000000));
-    errno = ECANCELED; // whoever reads errno after a sleep reads it too late
-    return 0;
-}
-
-extern "C" int __wrap_nanosleep(const struct timespec *request, struct timespec * /*remaining*/) {
-    waits.push_back(request->tv_sec * INT64_C(1000000000) + request->tv_nsec);
-    if (nanosleep_failure_in == 0 || --nanosleep_failure_in > 0)
-        return 0;
-    errno = nanosleep_error;
-    return -1;
+testing::AssertionResult logged(int priority, const std::string &text) {
+    const std::lock_guard lock(log_mutex);
+    drain();
+    testing::AssertionResult missing = testing::AssertionFailure();
+    missing << "not logged: " << priority << " " << text << "\nbut:\n";
+    for (const auto &message : parse(log_datagrams)) {
+        if (message.priority == priority && message.text == text)
+            return testing::AssertionSuccess();
+        missing << message.priority << " " << message.text << "\n";
+    }
+    return missing;
 }
 
 // ---- Scripted surrogate parent

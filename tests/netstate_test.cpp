@@ -14,15 +14,6 @@ using vlsys::format_text;
 using Netstate = Unit;
 using Row = std::pair<std::string, std::string>;
 
-static void (*before_getifaddrs)() = [] {}; // it fails when this leaves ENOMEM
-
-extern "C" decltype(getifaddrs) __real_getifaddrs;
-extern "C" int __wrap_getifaddrs(ifaddrs **list) {
-    errno = 0;
-    before_getifaddrs();
-    return errno == ENOMEM ? -1 : __real_getifaddrs(list);
-}
-
 static const std::string scripts = "/etc/sysconfig/network-scripts/ifcfg-",
                          missing = ": No such file or directory\n";
 
@@ -84,19 +75,18 @@ TEST_F(Netstate, InterfaceQueryFails) {
     vlsys_strlcpy(nif.addr6[3].addr, "stale", VLSYS_ADDR6_SIZE);
     EXPECT_EQ(vlsys_get_netif(nullptr, &nif) + vlsys_get_netif("eth0", nullptr), 2 * EFAULT);
     EXPECT_EQ(vlsys_get_netif("eth", &nif), ENXIO);
-    before_getifaddrs = [] { errno = ENOMEM; };
+    fail_call("getifaddrs", 1, ENOMEM);
     EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOMEM);
     EXPECT_EQ(take_log(), "3 getifaddrs: Cannot allocate memory\n");
     EXPECT_EQ(show(nif), " 0  1 //0/ 1 /0 /0 /0 stale/0");
-    before_getifaddrs = [] { unlink((scripts + "eth0").c_str()); };
+    before_call("getifaddrs", [] { unlink((scripts + "eth0").c_str()); });
     EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOENT);
     EXPECT_EQ(show(nif), "eth0 1 02-00-00-00-00-01 0 //0/ 1 /0 fe80::ff:fe00:1%eth0/64link /0 /0");
-    before_getifaddrs = [] { set_interfaces({}); };
+    before_call("getifaddrs", [] { set_interfaces({}); });
     nif = {};
     nif.has_ipv6 = 1;
     EXPECT_EQ(vlsys_get_netif("eth0", &nif), ENOENT);
     EXPECT_EQ(show(nif), " 0  0 //0/ 0 /0 /0 /0 /0");
-    before_getifaddrs = [] {};
 }
 
 template <class Gateway>

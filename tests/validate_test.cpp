@@ -57,19 +57,9 @@ static Setting make(const std::string &items) {
     return setting;
 }
 
-static int failing_getnameinfo; // counts down to the failing call
-
-extern "C" decltype(getnameinfo) __real_getnameinfo;
-extern "C" int __wrap_getnameinfo(const sockaddr *addr, socklen_t addrlen, char *host,
-                                  socklen_t hostlen, char *serv, socklen_t servlen, int flags) {
-    return --failing_getnameinfo == 0
-               ? EAI_AGAIN
-               : __real_getnameinfo(addr, addrlen, host, hostlen, serv, servlen, flags);
-}
-
 // The validator of one interface, or with a count that of several.
 static int check(Setting &s, int count) {
-    failing_getnameinfo = s.fail;
+    fail_call("getnameinfo", s.fail, EAI_AGAIN);
     return count == 0 ? vlsys_address_check(s.nif, s.gw4.addr, s.gw6.addr, &s.dns, s.host)
                       : vlsys_address_check2(s.nif, count, &s.gw4, &s.gw6, &s.dns, s.host);
 }
