@@ -1,46 +1,58 @@
-// A target feeds outside text to the library and asserts what must hold for any text.
+// A target feeds a text from outside to the library and checks what holds for any text.
 #pragma once
 
-#include "core/owners.h"
 #include "vlsys.h"
-#include <algorithm>
-#include <arpa/inet.h>
-#include <array>
-#include <cassert>
+
+#include <cstdlib>
 #include <cstring>
 #include <fstream>
 #include <map>
 #include <sstream>
+#include <string>
+#include <vector>
 
-using Input = std::array<std::string, 16>; // an input's pieces, which form feeds separate
-static void check(Input &in);              // the target's own
+#define CHECK(condition) check(condition, #condition)
 
-inline const std::string scratch = getenv("TMPDIR") ? getenv("TMPDIR") : "/dev/shm";
-inline std::map<std::string, std::string> files; // by name, what fopen finds on any path
+inline void check(bool holds, const char *condition) {
+    if (holds)
+        return;
+    fprintf(stderr, "does not hold: %s\n", condition);
+    abort();
+}
+
+static void feed(const std::string &text); // the target's own
+
+inline std::map<std::string, std::string> files; // what fopen finds by a path's last part
+
+inline std::string scratch(const std::string &name) {
+    const char *const directory = getenv("TMPDIR");
+    return std::string(directory ? directory : "/dev/shm") + "/" + name;
+}
+
 inline std::string read_file(const std::string &path) {
-    return {std::istreambuf_iterator<char>(std::ifstream(path).rdbuf()), {}};
+    std::ifstream file(path);
+    return {std::istreambuf_iterator<char>(file), {}};
 }
-inline bool has(const std::string &text, const std::string &part) {
-    return text.find(part) != text.npos;
-}
-template <class Record>
-std::string bytes_of(const Record &record) {
-    return {reinterpret_cast<const char *>(&record), sizeof record};
+
+inline std::vector<std::string> lines_of(const std::string &text) {
+    std::istringstream stream(text);
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(stream, line);)
+        lines.push_back(line);
+    return lines;
 }
 
 extern "C" {
 int LLVMFuzzerTestOneInput(const char *data, size_t size) {
-    Input in;
-    std::istringstream text({data, size});
-    for (std::string &piece : in)
-        std::getline(text, piece, '\f');
-    return check(in), 0;
+    feed({data, size});
+    return 0;
 }
 FILE *__real_fopen(const char *path, const char *mode);
 FILE *__wrap_fopen(const char *path, const char *mode) {
     const auto file = files.find(basename(path));
-    return file == files.end() ? __real_fopen(path, mode)
-                               : fmemopen(file->second.data(), file->second.size(), "r");
+    if (file == files.end())
+        return __real_fopen(path, mode);
+    return fmemopen(file->second.data(), file->second.size(), "r");
 }
 void __wrap_syslog(...) {}
 }
