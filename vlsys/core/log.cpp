@@ -27,14 +27,14 @@ class StdoutLock {
 
 VLSYS_PRINTF(2, 0)
 static void log_to_stdout(int priority, const char *format, va_list arguments) {
-    const SavedErrno caller;
+    const int reason = errno;
     const int level = LOG_PRI(priority);
     if ((log_mask & static_cast<uint32_t>(LOG_MASK(level))) == 0)
         return;
     const StdoutLock whole_line;
     if (priority != LOG_DEBUG)
         printf("%s[%d]: <%s>: [%d]: ", log_ident, getpid(), level_names[level], gettid());
-    errno = caller.value(); // for "%m"
+    errno = reason; // for "%m"
     vprintf(format, arguments);
     const size_t length = strlen(format);
     if (length == 0 || format[length - 1] != '\n')
@@ -43,7 +43,7 @@ static void log_to_stdout(int priority, const char *format, va_list arguments) {
 
 VLSYS_PRINTF(2, 0)
 static void log_to_system(int priority, const char *format, va_list arguments) {
-    const SavedErrno caller;
+    const int reason = errno;
     va_list again;
     va_copy(again, arguments);
     char *message = nullptr;
@@ -51,25 +51,25 @@ static void log_to_system(int priority, const char *format, va_list arguments) {
         const Text owner(message);
         syslog(priority, "[%d]: %s", gettid(), message);
     } else {
-        errno = caller.value(); // for "%m"
+        errno = reason; // for "%m"
         vsyslog(priority, format, again);
     }
     va_end(again);
 }
 
 int log_errno(const char *format, ...) {
-    const SavedErrno reason;
+    const int reason = errno;
     char with_reason[256];
     snprintf(with_reason, sizeof with_reason, "%s: %%m", format);
     va_list arguments;
     va_start(arguments, format);
-    errno = reason.value(); // for "%m"
+    errno = reason; // for "%m"
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral" // the caller's format was checked
     vlsys_vlog(LOG_ERR, with_reason, arguments);
 #pragma GCC diagnostic pop
     va_end(arguments);
-    return -reason.value();
+    return -reason;
 }
 
 } // namespace vlsys

@@ -1,7 +1,7 @@
+#include "build_date.h"
 #include "core/log.h"
 #include "core/owners.h"
 #include "core/paths.h"
-#include "version.h"
 
 #include <fcntl.h>
 

@@ -6,7 +6,6 @@
 #include "core/paths.h"
 #include "core/text.h"
 
-#include <cstring>
 #include <string_view>
 
 namespace vlsys {
@@ -153,6 +152,11 @@ struct Wait {
     int mask;      // of the last scan
 };
 
+// Names of boards, joined by ", ".
+struct BoardList {
+    char text[40] = "";
+};
+
 } // namespace
 
 static Wait wait_alive() {
@@ -200,32 +204,27 @@ static void report_alive() {
     vlsys_log(LOG_INFO, "HDCP handling capability: %s", can_handle_hdcp() ? "yes" : "no");
 }
 
-static void report_list(const char *what, const bool (&listed)[board_count]) {
-    char list[40] = "";
-    for (int i = 0; i < board_count; i++) {
-        if (!listed[i])
-            continue;
-        vlsys_strlcat(list, boards[i].name, sizeof list);
-        vlsys_strlcat(list, ", ", sizeof list);
-    }
-    char *const last_comma = strrchr(list, ',');
-    if (!last_comma)
-        return;
-    *last_comma = '\0';
-    vlsys_log(LOG_INFO, "%s device(s): %s", what, list);
+static void append(BoardList *list, const Board &board) {
+    if (list->text[0] != '\0')
+        vlsys_strlcat(list->text, ", ", sizeof list->text);
+    vlsys_strlcat(list->text, board.name, sizeof list->text);
 }
 
 static void report_timeout(const Wait &wait) {
     constexpr int polls_per_second = 30;
     vlsys_log(LOG_ERR, "timeout (%d). ", wait.polls / polls_per_second);
-    bool not_found[board_count];
-    bool not_alive[board_count];
-    for (int i = 0; i < board_count; i++) {
-        not_found[i] = (wait.mask & boards[i].found) == 0;
-        not_alive[i] = !not_found[i] && (wait.mask & boards[i].alive) == 0;
+    BoardList not_found;
+    BoardList not_alive;
+    for (const Board &board : boards) {
+        if ((wait.mask & board.found) == 0)
+            append(&not_found, board);
+        else if ((wait.mask & board.alive) == 0)
+            append(&not_alive, board);
     }
-    report_list("not found", not_found);
-    report_list("not alive", not_alive);
+    if (not_found.text[0] != '\0')
+        vlsys_log(LOG_INFO, "not found device(s): %s", not_found.text);
+    if (not_alive.text[0] != '\0')
+        vlsys_log(LOG_INFO, "not alive device(s): %s", not_alive.text);
 }
 
 } // namespace vlsys

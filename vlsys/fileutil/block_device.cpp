@@ -10,14 +10,14 @@
 
 namespace vlsys {
 
-// The size in bytes that the first line tells in sectors. Returns it, or the negated errno (not
-// logged).
+// The size in bytes that the first line tells in sectors, 0 without a line, or the negated errno
+// (not logged).
 static int64_t read_block_size(FILE *file) {
     constexpr int64_t sector_size = 512;
     constexpr int64_t sector_limit = INT64_MAX / sector_size;
-    char line[64] = ""; // of an empty file
+    char line[64];
     const int result = read_line(file, line, sizeof line);
-    if (result < 0)
+    if (result <= 0)
         return result;
     const unsigned long long sectors = strtoull(line, nullptr, 10);
     return sectors < sector_limit ? static_cast<int64_t>(sectors) * sector_size : INT64_MAX;

@@ -22,8 +22,8 @@ enum class Kind { waited, background, pipe_read };
 
 struct Protocol {
     const char *marker;  // sent after the command
-    size_t buffer_size;  // of the working directory, and of the reply: their size with a NUL
-    size_t request_size; // the same of the request
+    size_t buffer_size;  // of the working directory, and of the reply, NUL included
+    size_t request_size; // the request must be shorter
 };
 
 struct Reply {
@@ -66,8 +66,8 @@ static Fd connect_or_warn() {
     return Fd(socket);
 }
 
-// Null, and errno set, when it cannot be made. A line feed more than the two that it must have
-// would give the surrogate parent another command.
+// Null, with errno set, when it cannot be made. The surrogate parent would take what follows a line
+// feed in the directory or the command for another command.
 static Text make_request(Kind kind, const char *directory, const char *command) {
     const Protocol &protocol = protocol_of(kind);
     if (strchr(directory, '\n') || strchr(command, '\n')) {
@@ -88,9 +88,10 @@ static int log_request_failure(Kind kind, const char *directory, const char *com
         return log_errno("asprintf(\"%s\\n%s\\n\")", directory, command);
     case Kind::background:
         return log_errno("asprintf(\"%s\n%s &\\n\")", directory, command);
-    default:
-        return log_errno("snprintf(\"%s\\n%s |\\n\")", directory, command);
+    case Kind::pipe_read:
+        break;
     }
+    return log_errno("snprintf(\"%s\\n%s |\\n\")", directory, command);
 }
 
 static bool send_all(int socket, std::string_view text) {

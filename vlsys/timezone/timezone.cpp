@@ -54,8 +54,8 @@ static int set_localtime(const char *zone) {
     const int result = check_zone_file(zone_file);
     if (result != 0)
         return result;
-    const SystemPath localtime(localtime_path);
-    return replace_link(localtime.text, zone_file);
+    const SystemPath path(localtime_path);
+    return replace_link(path.text, zone_file);
 }
 
 namespace {
