@@ -109,7 +109,7 @@ static long read_version(Records &records) {
 // The bits that say why not are no failure of a call.
 static long scan_boards(Records & /*records*/) {
     const int boards = vlsys_avio_scan_alive();
-    return boards == VLSYS_AVIO_NO_DRIVER ? -1 : boards;
+    return boards == VLSYS_AVIO_NO_DRIVER || boards == 0 ? -1 : boards;
 }
 
 static long run_tool(Records & /*records*/) {

@@ -132,7 +132,8 @@ int scan_alive(FILE *file) {
         accept_alive(line.board, line.value);
         mask |= boards[line.board].alive;
     }
-    return more < 0 ? VLSYS_AVIO_NO_DRIVER : mask;
+    // What was found in a part of the file is not believed: a wait scans again.
+    return more < 0 ? mask & ~VLSYS_AVIO_READY : mask;
 }
 
 static File open_status() {

@@ -701,8 +701,8 @@ VLSYS_API int vlsys_pclose(FILE *stream);
  * /proc/driver/VlAvio/status. These operations read it into one table of the library, which belongs
  * to one thread; the product information below is taken from it. In the table a register is 0 until
  * it was read, and keeps its value when the file does not give it. Register lines under the header
- * of an unknown board (another device id) are skipped. A status file that cannot be read to its end
- * counts as one that could not be opened; the registers before that point are in the table.
+ * of an unknown board (another device id) are skipped. When a status file cannot be read to its end
+ * (logged at LOG_ERR), the registers before that point are in the table.
  */
 
 /* Device ids of the boards. */
@@ -719,7 +719,7 @@ VLSYS_API int vlsys_pclose(FILE *stream);
 #define VLSYS_AVIO_READY 0xff
 #define VLSYS_AVIO_UNKNOWN_DEVICE 0x100 /* an unknown board was seen */
 #define VLSYS_AVIO_STRAY_ALIVE 0x200    /* an Alive register stands before any board */
-#define VLSYS_AVIO_NO_DRIVER 0x400      /* alone: the status file could not be opened or read */
+#define VLSYS_AVIO_NO_DRIVER 0x400      /* alone: the status file could not be opened */
 
 /*
  * Reads the Config register of every board. A value of more than 32 bits, or below 0, is taken as
@@ -742,22 +742,22 @@ VLSYS_API int vlsys_avio_get_config(unsigned int device_id);
 /*
  * Reads the Alive register of every board. A value is taken only when it is odd (the board is
  * alive) and below 0x100; others are ignored.
- * Returns the bits described above.
+ * Returns the bits described above; no board counts as found when the file cannot be read to its
+ * end.
  * Logs the values of KRD-31 and TBX-204 at LOG_DEBUG, an unknown board at LOG_ERR.
  */
 VLSYS_API int vlsys_avio_scan_alive(void);
 
 /*
  * Waits until all boards are alive, then reads the Config registers and reports.
- * Returns 1 when the boards came up, or no status file can be read, and none booted from its backup
- * image; else 0.
- * Logs the beginning and the end of the wait at LOG_INFO ("can't get VlAvio status. Emulator ?" at
- * LOG_WARNING without a status file), and each Config register at LOG_INFO, with a LOG_WARNING for
- * a boot from backup or an illegal value. With the boards up, or without a status file, frame
- * frequency, destination and HDCP capability follow at LOG_INFO; else "timeout (<seconds>). " at
- * LOG_ERR, and the boards not found and those not alive at LOG_INFO.
- * Blocks a little under 29 seconds at most: 960 scans, about 30 ms apart. The wait ends at once
- * when the status file is missing or cannot be read, and when a signal interrupts a sleep.
+ * Returns 1 when the boards came up, or no status file can be opened, and none booted from its
+ * backup image; else 0. Logs the beginning and the end of the wait at LOG_INFO ("can't get VlAvio
+ * status. Emulator ?" at LOG_WARNING without a status file), and each Config register at LOG_INFO,
+ * with a LOG_WARNING for a boot from backup or an illegal value. With the boards up, or without a
+ * status file, frame frequency, destination and HDCP capability follow at LOG_INFO; else "timeout
+ * (<seconds>). " at LOG_ERR, and the boards not found and those not alive at LOG_INFO. Blocks a
+ * little under 29 seconds at most: 960 scans, about 30 ms apart. The wait ends at once when the
+ * status file cannot be opened, and when a signal interrupts a sleep.
  */
 VLSYS_API int vlsys_avio_wait_ready(void);
 
