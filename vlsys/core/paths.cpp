@@ -1,28 +1,33 @@
 #include "core/paths.h"
 
 #include "core/log.h"
-#include "core/owners.h"
-
+#include <cstdlib>
 #include <cstring>
 
 namespace vlsys {
 
-static Text path_root;
-static Text path_prefix;
-static Text path_data;
+// Not owners, which would free them when the process exits: another thread may still be at work.
+static char *path_root;
+static char *path_prefix;
+static char *path_data;
+
+static void replace(char **path, char *text) {
+    free(*path);
+    *path = text;
+}
 
 static const char *environment(const char *name, const char *fallback) {
     const char *value = getenv(name);
     return value ? value : fallback;
 }
 
-static int join(Text *path, const char *root, const char *rest, const char *failure) {
+static int join(char **path, const char *root, const char *rest, const char *failure) {
     const size_t size = strlen(root) + strlen(rest) + 1;
-    path->reset(static_cast<char *>(malloc(size)));
+    replace(path, static_cast<char *>(malloc(size)));
     if (!*path)
         return log_errno("%s", failure);
-    vlsys_strlcpy(path->get(), root, size);
-    vlsys_strlcat(path->get(), rest, size);
+    vlsys_strlcpy(*path, root, size);
+    vlsys_strlcat(*path, rest, size);
     return 0;
 }
 
@@ -31,7 +36,7 @@ int set_up_paths() {
     const char *prefix = environment("VL_PREFIX", "/usr");
     const char *data = environment("VL_DATA", "/velmora");
 
-    path_root.reset(strdup(root));
+    replace(&path_root, strdup(root));
     if (!path_root)
         return log_errno("%s", "strdup(path_root)");
     const int result = join(&path_prefix, root, prefix, "malloc(path_prefix)");
@@ -41,19 +46,19 @@ int set_up_paths() {
 }
 
 void drop_paths() {
-    path_root.reset();
-    path_prefix.reset();
-    path_data.reset();
+    replace(&path_root, nullptr);
+    replace(&path_prefix, nullptr);
+    replace(&path_data, nullptr);
 }
 
-static int64_t get_path(const Text &path, char *buffer, size_t size) {
+static int64_t get_path(const char *path, char *buffer, size_t size) {
     if (!path)
         return VLSYS_NOT_STARTED;
     if (!buffer)
-        return static_cast<int64_t>(strlen(path.get()));
+        return static_cast<int64_t>(strlen(path));
     if (size == 0)
         return 0;
-    return static_cast<int64_t>(vlsys_strlcpy(buffer, path.get(), size));
+    return static_cast<int64_t>(vlsys_strlcpy(buffer, path, size));
 }
 
 SystemPath::SystemPath(const char *fixed, const char *name) {
