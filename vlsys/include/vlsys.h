@@ -192,6 +192,8 @@ VLSYS_API int vlsys_setlogmask(int mask);
  *   -EFAULT  null zone;
  *   -ENOENT  empty zone (silent), no clock file, no zone file, or one without "TZif" at its start;
  *   -ENAMETOOLONG  the zone file's path is over 4095 bytes;
+ *   -EINVAL  a shell that reads the clock file could run the zone: it has a "$", a backquote, a
+ *   backslash, a line feed, or a double quote other than its first and last character;
  *   -EIO  zone file of fewer than 4 bytes;
  *   other negated errno  of the step that failed.
  * After a failure in the zone file or the link, /etc/localtime is what it was. After a failure in

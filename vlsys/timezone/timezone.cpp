@@ -30,6 +30,15 @@ static int check_zone_file(const char *path) {
     return 0;
 }
 
+// Whether a shell that sources the clock file would take the zone, in its double quotes, for more
+// than a text. A zone may have brought the quotes along.
+static bool has_shell_text(const char *zone) {
+    if (*zone == '"')
+        zone++;
+    zone += strcspn(zone, "\"$`\\\n");
+    return *zone != '\0' && strcmp(zone, "\"") != 0;
+}
+
 // Makes a link beside the path and moves it there, so that the path always names something.
 static int replace_link(const char *path, const char *target) {
     const Text link = format_text("%s.new", path);
@@ -49,6 +58,10 @@ static int set_localtime(const char *zone) {
     vlsys_strlcpy(zone_file, zoneinfo_prefix, sizeof zone_file);
     if (vlsys_strlcat(zone_file, zone, sizeof zone_file) >= sizeof zone_file) {
         errno = ENAMETOOLONG; // the beginning may be the path of another zone
+        return log_errno("open(%s)", zone_file);
+    }
+    if (has_shell_text(zone)) {
+        errno = EINVAL; // such a file may exist: a zone with ".." leads out of the directory
         return log_errno("open(%s)", zone_file);
     }
     const int result = check_zone_file(zone_file);
