@@ -2,6 +2,7 @@
 
 #include "core/log.h"
 #include "core/owners.h"
+#include "netconf/interfaces.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -62,6 +63,14 @@ int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, siz
     return 0;
 }
 
+// The resolver takes a scope that it cannot look up for an unknown one. Returns the positive errno
+// of the look-up, logged, or 0 when the scope is unknown indeed or there is none.
+static int find_scope_error(const char *text) {
+    const char *const scope = strchr(text, '%');
+    const int missing = scope ? find_interface(scope + 1) : 0;
+    return missing == -ENXIO ? 0 : -missing;
+}
+
 static int text_to_addr(const AddressField &field, int family, void *out, size_t size) {
     if (!field.label)
         return EINVAL;
@@ -85,6 +94,8 @@ static int text_to_addr(const AddressField &field, int family, void *out, size_t
     if (error == EAI_SYSTEM)
         return -log_errno("%s: %s", field.label, text);
     if (error != 0) {
+        if (const int unknown = find_scope_error(text))
+            return unknown;
         vlsys_log(LOG_ERR, "%s: %s: %s", field.label, text, gai_strerror(error));
         return field.code | VLSYS_CHECK_KIND_INVALID;
     }
