@@ -52,9 +52,11 @@ static int ipv4_text(const sockaddr *addr, char (&text)[Size], const char *label
 
 static int read_ipv4(const ifaddrs &entry, vlsys_ifconf *nif) {
     nif->up = (entry.ifa_flags & IFF_UP) != 0;
+    // An address whose peer is 0.0.0.0 comes without either.
+    const sockaddr *const broadaddr = entry.ifa_broadaddr ? entry.ifa_broadaddr : entry.ifa_addr;
     int result = ipv4_text(entry.ifa_addr, nif->addr, "addr");
     if (result == 0 && (entry.ifa_flags & IFF_BROADCAST) != 0)
-        result = ipv4_text(entry.ifa_broadaddr, nif->broadaddr, "broadaddr");
+        result = ipv4_text(broadaddr, nif->broadaddr, "broadaddr");
     if (result == 0)
         result = ipv4_text(entry.ifa_netmask, nif->netmask, "netmask");
     if (result != 0)
