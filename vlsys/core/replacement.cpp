@@ -68,7 +68,7 @@ bool Replacement::write_all(std::string_view bytes) const {
 // Where files carry security labels, one without its own may be closed to those who need it.
 void Replacement::keep_security_label() const {
     static constexpr char name[] = "security.selinux";
-    char label[256];
+    char label[4096]; // the longest that the kernel gives a file
     const ssize_t size = getxattr(path_, name, label, sizeof label);
     if (size > 0 && fsetxattr(fd_.get(), name, label, static_cast<size_t>(size), 0) != 0)
         log_errno("fsetxattr(%s, %s)", temporary_.get(), name);
