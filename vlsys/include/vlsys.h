@@ -909,7 +909,8 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  * "Canonical" is the text that getnameinfo gives for an address. The checks, in this order:
  * - The interface exists.
  * - Every IPv4 address: not 0.0.0.0, not in 127.0.0.0/8, and below 224.0.0.0. Every IPv6 address:
- *   in 2000::/3, in fc00::/7, or link-local with its "%interface".
+ *   in 2000::/3, in fc00::/7, or link-local with its "%interface", whose name has letters, digits
+ *   and "._-@+" alone.
  * - IPv4 Manual: addr, netmask and the gateway become canonical, broadaddr is filled. A netmask
  *   that begins with a number from 8 to 30 is a prefix length and becomes a mask: "24", "24abc" and
  *   "24.0.0.0" are all 255.255.255.0. ("31" is the mask 0.0.0.31, which has a gap.) The gateway

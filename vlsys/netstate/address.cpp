@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <memory>
+#include <net/if.h>
 #include <netdb.h>
 
 namespace vlsys {
@@ -119,6 +120,17 @@ static bool is_unique_local(const in6_addr &address) {
     return address.s6_addr[0] >> 1 == 0x7E;
 }
 
+// The kernel lets an interface be named "$(x)". Such a name must not get into a file that scripts
+// run as shell text, and with the scope of an address it would.
+static bool has_plain_scope(const sockaddr_in6 &address) {
+    char name[IF_NAMESIZE];
+    if (!if_indextoname(address.sin6_scope_id, name))
+        return true; // the scope stays a number
+    static constexpr char plain[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789"
+                                    "._-@+";
+    return name[strspn(name, plain)] == '\0';
+}
+
 int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
     const AddressField field = make_field(text, VLSYS_ADDR6_SIZE, fieldcode);
     if (const int error = text_to_addr(field, AF_INET6, out, sizeof *out))
@@ -126,7 +138,7 @@ int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
 
     const in6_addr &address = out->sin6_addr;
     if (IN6_IS_ADDR_LINKLOCAL(&address)) {
-        if (out->sin6_scope_id == 0)
+        if (out->sin6_scope_id == 0 || !has_plain_scope(*out))
             return fieldcode | VLSYS_CHECK_KIND_INVALID;
     } else if (!is_global_unicast(address) && !is_unique_local(address)) {
         return fieldcode | VLSYS_CHECK_KIND_RANGE;

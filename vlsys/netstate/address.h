@@ -22,7 +22,7 @@ int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, siz
                  const char *label);
 
 // `text` is a buffer of VLSYS_ADDR6_SIZE bytes. Allowed: global unicast, unique local, and
-// link-local with a scope.
+// link-local with a scope whose name is letters, digits and "._-@+".
 int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode);
 
 // `text` is a buffer of at most VLSYS_ADDR6_SIZE bytes. Refused: 0.0.0.0, 127.0.0.0/8 and all from
