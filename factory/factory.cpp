@@ -33,11 +33,19 @@ static int factory_init_timezone() {
     return 0;
 }
 
+// The host name goes into a file that scripts source as root, and the serial number comes from
+// whoever answered in the surrogate parent's place.
+static bool is_shell_text(const char *serial) {
+    return strpbrk(serial, "$`\\\"';&|<>()") != nullptr;
+}
+
 // Model word and serial number; of the number at most 8 characters fit into the tool's 16 bytes.
 static int factory_make_hostname(char *hostname, size_t size) {
     char serial[16] = "00000"; // what a unit without a serial number is named after
     if (vlsys_get_serial_number(serial, sizeof serial) < 0)
         return failed(__func__, 53);
+    if (is_shell_text(serial))
+        return -1;
     return snprintf(hostname, size, "rhx416-%s", serial) < 0 ? -1 : 0;
 }
 
