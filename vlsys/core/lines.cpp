@@ -22,7 +22,7 @@ int read_line(FILE *file, char *line, size_t size) {
             line[length++] = static_cast<char>(c);
     }
     line[length] = '\0';
-    if (c == EOF && ferror_unlocked(file))
+    if (c == EOF && ferror_unlocked(file) && errno != EISDIR)
         return -errno;
     return any ? 1 : 0;
 }

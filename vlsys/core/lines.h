@@ -12,7 +12,8 @@ int next_byte(FILE *file);
 // Reads one line, line feed included, into `line`. A line of `size` bytes or more keeps its first
 // size - 1 bytes; the rest is read and dropped, so that no piece of a long line is ever taken for a
 // line of its own.
-// Returns 1; 0 at the end of the file; the negated errno when the file cannot be read (not logged).
+// Returns 1; 0 at the end of the file, and for a directory, which opens as a file does and reads as
+// an empty one; the negated errno when the file cannot be read (not logged).
 int read_line(FILE *file, char *line, size_t size);
 
 // A KEY=value line, both parts inside the line's own buffer.

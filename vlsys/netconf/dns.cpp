@@ -159,7 +159,7 @@ static int read_dns_of(const char *name, DnsSettings *settings) {
     if (result != 0)
         return result;
     result = read_peerdns(ifcfg.file.get(), settings);
-    if (result != 0 && result != -EISDIR) // a directory reads as empty
+    if (result != 0)
         return log_errno("%s: fgets(%s)", self, ifcfg.path.get());
     return 0;
 }
@@ -193,7 +193,7 @@ static int get_dns(vlsys_dns *dns) {
     if (!file)
         return errno == ENOENT ? 0 : log_errno("%s", resolv_path);
     const int result = read_resolver(file.get(), dns);
-    if (result != 0 && result != -EISDIR) { // a directory reads as empty
+    if (result != 0) {
         *dns = {};
         return log_errno("fgets(%s)", resolv_path);
     }

@@ -96,7 +96,7 @@ static int read_ifcfg(const char *name, AddressSettings *settings) {
     if (result != 0)
         return result;
     result = read_addresses(ifcfg.file.get(), settings);
-    if (result != 0 && result != -EISDIR) // a directory reads as empty
+    if (result != 0)
         return log_errno("%s: fgets(%s)", "get_mode", ifcfg.path.get());
     settings->fixed |= strcmp(name, "lo") == 0;
     return 0;
