@@ -100,10 +100,11 @@ int vlsys_set_hostname_immediately(const char *name) {
         vlsys_log(LOG_INFO, "%s: do not set up for the same hostname: %s", self, name);
         return 0;
     }
-    result = write_hostname(name);
+    result = vlsys_set_hostname(name);
     if (result != 0) {
-        errno = -result;
-        return -log_errno("%s: vlsys_set_hostname(%s)", self, name);
+        errno = result;
+        log_errno("%s: vlsys_set_hostname(%s)", self, name);
+        return result;
     }
     const size_t length = strlen(name);
     if (sethostname(name, length) != 0)

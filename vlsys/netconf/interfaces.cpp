@@ -25,10 +25,11 @@ struct Name {
 } // namespace
 
 // The C library asks the kernel by way of a socket, and when it gets none says ENOENT, whatever the
-// reason. A socket of our own tells it.
-static void find_reason() {
-    if (errno == ENOENT)
-        const Fd tried(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+// reason. A socket of our own fails alike and leaves the reason in errno.
+static void set_true_errno() {
+    if (errno != ENOENT)
+        return;
+    const Fd tried(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
 }
 
 int find_interface(const char *name, unsigned int *index) {
@@ -36,14 +37,14 @@ int find_interface(const char *name, unsigned int *index) {
     if (found == 0) {
         if (errno == ENODEV)
             return -ENXIO;
-        find_reason();
+        set_true_errno();
         return log_errno("if_nametoindex(%s)", name);
     }
     char own_name[IF_NAMESIZE];
     if (!if_indextoname(found, own_name)) {
         if (errno == ENXIO)
             return -ENXIO;
-        find_reason();
+        set_true_errno();
         return log_errno("if_indextoname(%u)", found);
     }
     if (strcmp(name, own_name) != 0)

@@ -40,8 +40,8 @@ class ItemList {
   public:
     explicit ItemList(std::span<edit_item> array) : array_(array) {}
 
-    void set(const char *key, const char *value) { add({0, key, value}); }
-    void remove(const char *key) { add({1, key, ""}); }
+    void set(const char *key, const char *value) { add({.remove = 0, .key = key, .value = value}); }
+    void remove(const char *key) { add({.remove = 1, .key = key, .value = ""}); }
 
     template <class Texts>
     void add_cell(const char *key, const Cell<Texts> &cell, const Texts &texts) {

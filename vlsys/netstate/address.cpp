@@ -45,7 +45,12 @@ static AddressField make_field(char *text, size_t capacity, int fieldcode) {
     const int number = VLSYS_CHECK_FIELD(fieldcode);
     const bool has_label =
         number >= VLSYS_CHECK_FIELD_IPV4_ADDR && number <= VLSYS_CHECK_FIELD_HOSTNAME;
-    return {text, capacity, fieldcode, has_label ? field_labels[number] : nullptr};
+    return {
+        .text = text,
+        .capacity = capacity,
+        .code = fieldcode,
+        .label = has_label ? field_labels[number] : nullptr,
+    };
 }
 
 int addr_to_text(const struct sockaddr *addr, socklen_t addrlen, char *text, size_t textcap,

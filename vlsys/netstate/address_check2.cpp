@@ -99,9 +99,9 @@ static Overlap find_overlap(std::span<const Subnet> subnets) {
             continue;
         for (size_t j = 0; j < subnets.size(); j++)
             if (subnets[i].contains(subnets[j].address) && j != i && subnets[j].is_set())
-                return {true, i, j};
+                return {.found = true, .first = i, .second = j};
     }
-    return {false, 0, 0};
+    return {};
 }
 
 static int check_overlap4(const Network &network) {
@@ -131,7 +131,7 @@ static int check_overlap6(const Network &network) {
 template <class Subnet, class Address>
 static Place find_place(std::span<const Subnet> subnets, const Address &address, int field,
                         const char *label, const char *text) {
-    Place place = {-1, 0};
+    Place place = {.position = -1, .fault = 0};
     for (size_t i = 0; i < subnets.size() && place.fault == 0; i++) {
         if (!subnets[i].is_set() || !subnets[i].contains(address))
             continue;
@@ -363,7 +363,11 @@ int vlsys_address_check2(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw
     if (!subnets6)
         return errno;
 
-    Network network = {{nifs, size}, {subnets4.get(), size}, {subnets6.get(), size}};
+    Network network = {
+        .nifs = {nifs, size},
+        .subnets4 = {subnets4.get(), size},
+        .subnets6 = {subnets6.get(), size},
+    };
     const int result = check_network(&network, gw4, gw6, dns, hostname);
     if (result == 0)
         vlsys_log(LOG_INFO, "%s: OK", "vlsys_address_check2");

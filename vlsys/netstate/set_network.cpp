@@ -103,10 +103,11 @@ static void clear_unread(const NetworkSetting &setting) {
 
 // ---- What the network scripts do not serve
 
-static sockaddr_in parse_ipv4(const char *text) {
+// In host byte order.
+static uint32_t parse_ipv4(const char *text) {
     sockaddr_in result = {};
     inet_pton(AF_INET, text, &result.sin_addr);
-    return result;
+    return host_order(result);
 }
 
 // Without its "%interface".
@@ -125,11 +126,11 @@ static bool is_link_local(const char *text) {
 }
 
 static bool is_in_fixed_subnet4(const NetworkSetting &setting, const char *text) {
-    const uint32_t address = host_order(parse_ipv4(text));
+    const uint32_t address = parse_ipv4(text);
     for (const vlsys_ifconf &nif : setting.nifs) {
         if (nif.ipv4_mode != VLSYS_MODE_MANUAL)
             continue;
-        const Subnet4 subnet(host_order(parse_ipv4(nif.addr)), host_order(parse_ipv4(nif.netmask)));
+        const Subnet4 subnet(parse_ipv4(nif.addr), parse_ipv4(nif.netmask));
         if (subnet.contains(address))
             return true;
     }
@@ -209,7 +210,13 @@ int vlsys_set_network(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *
     *step = VLSYS_STEP_CHECK;
     if (!nifs || count < 1 || !gw4 || !gw6 || !dns || !hostname)
         return EFAULT;
-    const NetworkSetting setting = {{nifs, static_cast<size_t>(count)}, *gw4, *gw6, *dns, hostname};
+    const NetworkSetting setting = {
+        .nifs = {nifs, static_cast<size_t>(count)},
+        .gw4 = *gw4,
+        .gw6 = *gw6,
+        .dns = *dns,
+        .hostname = hostname,
+    };
     const int fault = check_setting(setting, hostname);
     if (fault != 0)
         return fault;
