@@ -76,7 +76,8 @@ void Replacement::keep_security_label() const {
 
 // On some file systems there is nothing to flush.
 static bool flush_to_disk(int fd) {
-    return fsync(fd) == 0 || errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP;
+    return TEMP_FAILURE_RETRY(fsync(fd)) == 0 || errno == EINVAL || errno == ENOSYS ||
+           errno == EOPNOTSUPP;
 }
 
 int Replacement::commit() {

@@ -16,13 +16,14 @@
  *
  * A setter that rewrites a sysconfig file (but for the clock file) or the sysctl drop-in,
  * /etc/sysctl.d/velmora, drops comments and empty lines, changes only the first line of a key, and
- * makes a missing file and its directories (mode 0755). When two setters rewrite one file at once,
- * the later rename wins, and what the other one wrote is lost.
+ * makes a missing file and its directories (mode 0755, less the umask). When two setters rewrite
+ * one file at once, the later rename wins, and what the other one wrote is lost.
  *
  * Files named "<root>/..." are found under the root path (VL_ROOT, see vlsys_init), all others at
  * the path given.
  *
- * Results: EFAULT means a null argument; nothing was done, and nothing is logged.
+ * Results: a file that opens and cannot be read is a failure, a directory in its place is an empty
+ * file. EFAULT means a null argument; nothing was done, and nothing is logged.
  *
  * Logging: every failed call is logged at LOG_ERR with a message that names the call, warnings at
  * LOG_WARNING, settings written and values read at LOG_INFO, traces at LOG_DEBUG. Each operation
@@ -842,7 +843,7 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
 #define VLSYS_CHECK_IS_CODE(result) ((result) >= 0x100)
 #define VLSYS_CHECK_POSITION(code) (((code) >> 8) - 1)
 #define VLSYS_CHECK_FIELD(code) (((code) >> 4) & 0xF)
-#define VLSYS_CHECK_KIND(code) ((code)&0xF)
+#define VLSYS_CHECK_KIND(code) (0xF & (code))
 
 /* Fields. A fault of vlsys_dns server[2] carries VLSYS_CHECK_FIELD_IPV6_ADDR. */
 #define VLSYS_CHECK_FIELD_IPV4_ADDR 1
@@ -1015,6 +1016,7 @@ VLSYS_API size_t vlsys_check_text(int code, const vlsys_ifconf *nifs, int count,
  * Checks the network setting of `count` interfaces with vlsys_address_check2 and writes it with the
  * setters, in the order of the steps above. Use it to set what a person or another program asked
  * for: no text that the check did not read reaches the files.
+ * - A list with a virtual bridge (virbr*), or with one interface twice, is refused.
  * - A mode that its field does not have is refused: above VLSYS_MODE_AUTO for IPv6 and the IPv6
  *   gateway, above VLSYS_MODE_DHCP for IPv4, the IPv4 gateway and DNS.
  * - After the check, every field that the modes leave unread is cleared in the caller's records:
@@ -1025,12 +1027,13 @@ VLSYS_API size_t vlsys_check_text(int code, const vlsys_ifconf *nifs, int count,
  * - The first failure ends it; what was written before it stays.
  *
  * `step` may be null. It receives VLSYS_STEP_NONE, or the step that failed.
- * Returns 0; a check code; EINVAL for a mode that is refused (logged); EFAULT for a null argument
- * or a count below 1; else the positive errno of the check or of the setter that failed.
+ * Returns 0; a check code; EINVAL for a list or mode that is refused (logged); EFAULT for a null
+ * argument or a count below 1; else the positive errno of the check or of the setter that failed.
  * Logs what the check and the setters log. At LOG_WARNING it logs what the check lets pass and the
- * network scripts do not serve (the result is 0 all the same): a link-local address as the fixed
- * IPv6 address, an IPv4 gateway outside every fixed subnet, and a global IPv6 gateway outside every
- * fixed subnet, which the scripts set before the prefix is learnt.
+ * network scripts may not serve (the result is 0 all the same): a link-local address as the fixed
+ * IPv6 address; an IPv4 gateway outside every fixed subnet, which must then lie in a lease's; and a
+ * global IPv6 gateway outside every fixed subnet, whose prefix must be learnt before the scripts
+ * set it.
  */
 VLSYS_API int vlsys_set_network(vlsys_ifconf *nifs, int count, vlsys_gw4 *gw4, vlsys_gw6 *gw6,
                                 vlsys_dns *dns, char *hostname, int *step);

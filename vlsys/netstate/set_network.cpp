@@ -1,6 +1,7 @@
 // A whole network setting, from the check to the last file.
 #include "core/log.h"
 #include "core/text.h"
+#include "netconf/interfaces.h"
 #include "netstate/subnet.h"
 
 #include <arpa/inet.h>
@@ -23,7 +24,28 @@ struct NetworkSetting {
 
 } // namespace
 
-// ---- Modes
+// ---- What the check lets pass and no setter can serve
+
+static bool is_given_before(std::span<const vlsys_ifconf> nifs, const vlsys_ifconf &nif) {
+    for (const vlsys_ifconf &other : nifs.first(static_cast<size_t>(&nif - nifs.data())))
+        if (strncmp(other.name, nif.name, sizeof nif.name) == 0)
+            return true;
+    return false;
+}
+
+// Of one that is given twice only the later setting would stay, and no DNS setting is written for a
+// virtual bridge.
+static bool has_usable_names(const NetworkSetting &setting) {
+    for (const vlsys_ifconf &nif : setting.nifs) {
+        const FieldText name(nif.name);
+        if (is_virtual_bridge(name.text) || is_given_before(setting.nifs, nif)) {
+            vlsys_log(LOG_ERR, "%s: %s: a virtual bridge, or given twice", "vlsys_set_network",
+                      name.text);
+            return false;
+        }
+    }
+    return true;
+}
 
 static bool has_mode(const char *field, uint32_t mode, uint32_t highest) {
     if (mode <= highest)
@@ -47,7 +69,7 @@ static bool has_known_modes(const NetworkSetting &setting) {
 
 // 0, a check code or a positive errno.
 static int check_setting(const NetworkSetting &setting, char *hostname) {
-    if (!has_known_modes(setting))
+    if (!has_usable_names(setting) || !has_known_modes(setting))
         return EINVAL;
     const int fault =
         vlsys_address_check2(setting.nifs.data(), static_cast<int>(setting.nifs.size()),
@@ -157,13 +179,15 @@ static void warn_of_unserved(const NetworkSetting &setting) {
     const FieldText gateway4(setting.gw4.addr);
     if (!gateway4.is_empty() && !is_in_fixed_subnet4(setting, gateway4.text))
         vlsys_log(LOG_WARNING,
-                  "the network scripts install no IPv4 gateway outside the fixed subnets: %s",
+                  "the network scripts set an IPv4 gateway outside the fixed subnets only where a "
+                  "lease's subnet holds it: %s",
                   gateway4.text);
     const FieldText gateway6(setting.gw6.addr);
     if (!gateway6.is_empty() && !is_link_local(gateway6.text) &&
         !is_in_fixed_subnet6(setting, gateway6.text))
         vlsys_log(LOG_WARNING,
-                  "the network scripts install no global IPv6 gateway in a learnt subnet: %s",
+                  "the network scripts set a global IPv6 gateway outside the fixed subnets only "
+                  "where its prefix is known before: %s",
                   gateway6.text);
 }
 
