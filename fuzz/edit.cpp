@@ -2,12 +2,17 @@
 #include "netconf/edit.h"
 #include "fuzz.h"
 
+#include <fstream>
+
 static std::string edit(const std::string &old) {
     static const vlsys::edit_item items[] = {{0, "ONBOOT", "no"}, {0, "NEW", ""}};
-    const std::string path = scratch("edited");
+    const char *const directory = getenv("TMPDIR");
+    CHECK(directory);
+    const std::string path = std::string(directory) + "/edited";
     std::ofstream(path) << old;
     CHECK(vlsys::edit(path.c_str(), items, 2) == 0);
-    return read_file(path);
+    std::ifstream file(path);
+    return {std::istreambuf_iterator<char>(file), {}};
 }
 
 static void feed(const std::string &text) {

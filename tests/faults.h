@@ -8,16 +8,15 @@ namespace test {
 
 enum class Fault {
     none,
-    copy_etc, // no fault: /etc is copied to /run/versions/1, 2, 3 ... after each call of rename
+    copy_etc, // no fault: /etc is copied into /run/versions after each call of rename
     failure,  // the call fails; it counts once for each way to fail
     kill,     // the process is killed before the call
-    power_cut // the same, and no file keeps what was not flushed to the disk
+    power_cut // the same, and no replaced file keeps what was not flushed to the disk
 };
 
 // What happened; kept in shared memory, so that it outlives the process.
 struct Strike {
-    bool struck;     // else there was no such call
-    char call[16];   // its name
+    char call[16];   // its name; "" when there was no such call
     int error;       // its errno
     bool must_retry; // it was interrupted, or cannot be done at all: nobody shall notice
     int held;        // taken from the system so far, and not given back

@@ -5,18 +5,12 @@
 #include "vlsys.h"
 
 #include <algorithm>
-#include <csignal>
-#include <cstring>
 #include <filesystem>
 #include <fstream>
-#include <fts.h>
-#include <netinet/in.h>
-#include <netinet/tcp.h>
-#include <numeric>
+#include <iterator>
 #include <poll.h>
 #include <set>
 #include <sstream>
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -24,9 +18,19 @@ namespace fs = std::filesystem;
 
 namespace test {
 
+Output capture(const std::string &command) {
+    FILE *const pipe = popen(command.c_str(), "r");
+    Output output;
+    for (int c = 0; (c = getc(pipe)) != EOF;)
+        output.text.push_back(static_cast<char>(c));
+    const int status = pclose(pipe);
+    output.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    return output;
+}
+
 std::string read_file(const std::string &path) {
     const std::ifstream file(path);
-    EXPECT_TRUE(file) << "cannot read " << path;
+    EXPECT_TRUE(file.is_open()) << "cannot read " << path;
     std::ostringstream text;
     text << file.rdbuf();
     return text.str();
@@ -37,10 +41,7 @@ void write_file(const std::string &path, const std::string &content) {
 }
 
 std::string list_directory(const std::string &path) {
-    std::set<std::string> names;
-    for (const auto &entry : fs::directory_iterator(path))
-        names.insert(entry.path().filename().string() + "\n");
-    return std::accumulate(names.begin(), names.end(), std::string());
+    return capture("ls -A " + path).text;
 }
 
 unsigned mode_of(const std::string &path) {
@@ -48,37 +49,28 @@ unsigned mode_of(const std::string &path) {
 }
 
 std::string link_target(const std::string &path) {
-    char target[4096];
-    const ssize_t length = readlink(path.c_str(), target, sizeof target);
-    return {target, static_cast<size_t>(std::max<ssize_t>(length, 0))};
+    std::error_code error;
+    return fs::read_symlink(path, error);
 }
-
-// ---- What changed
 
 static std::string describe(const fs::path &path) {
     if (fs::is_symlink(path))
         return "-> " + link_target(path) + "\n";
-    char mode[] = "mode 0000\n";
-    snprintf(mode, sizeof mode, "mode %04o\n", mode_of(path) & 07777);
-    return (mode_of(path) == 0644 ? "" : mode) + read_file(path);
+    return (mode_of(path) == 0644 ? "" : "its mode is not 0644\n") + read_file(path);
 }
 
 Files unit_files(const std::string &directory) {
     Files files;
-    std::string root = directory;
-    char *const roots[] = {root.data(), nullptr};
-    FTS *const walk = fts_open(roots, FTS_PHYSICAL | FTS_NOCHDIR, nullptr);
-    while (const FTSENT *entry = fts_read(walk)) {
-        const bool is_link = entry->fts_info == FTS_SL || entry->fts_info == FTS_SLNONE;
-        const bool is_machines = is_link && link_target(entry->fts_path).starts_with("/run/host/");
-        if ((is_link || entry->fts_info == FTS_F) && !is_machines)
-            files[entry->fts_path + root.size() + 1] = describe(entry->fts_path);
+    for (const auto &entry : fs::recursive_directory_iterator(directory)) {
+        const bool is_link = entry.is_symlink();
+        const bool is_machines = is_link && link_target(entry.path()).starts_with("/run/host/");
+        if (!is_machines && (is_link || !entry.is_directory()))
+            files[entry.path().lexically_relative(directory)] = describe(entry.path());
     }
-    fts_close(walk);
     return files;
 }
 
-static std::vector<std::string> split_lines(const std::string &text) {
+static std::vector<std::string> lines_of(const std::string &text) {
     std::istringstream stream(text);
     std::vector<std::string> lines;
     for (std::string line; std::getline(stream, line);)
@@ -86,24 +78,20 @@ static std::vector<std::string> split_lines(const std::string &text) {
     return lines;
 }
 
-static std::string key_of(const std::string &line) {
-    const std::string key = line.substr(0, line.find('='));
-    return key.substr(0, key.find_last_not_of(' ') + 1);
-}
-
 static std::string changed_lines(const std::string &before, const std::string &after) {
-    const std::vector<std::string> old_lines = split_lines(before);
-    const std::set<std::string> known(old_lines.begin(), old_lines.end());
+    const std::vector<std::string> old_lines = lines_of(before);
     std::set<std::string> keys;
     std::string changed;
-    for (const auto &line : split_lines(after)) {
-        keys.insert(key_of(line));
-        if (!known.contains(line))
+    for (const auto &line : lines_of(after)) {
+        keys.insert(line.substr(0, line.find('=')));
+        if (std::find(old_lines.begin(), old_lines.end(), line) == old_lines.end())
             changed += "+" + line + "\n";
     }
-    for (const auto &line : old_lines)
-        if (!line.empty() && line[0] != '#' && !keys.contains(key_of(line)))
-            changed += "-" + key_of(line) + "\n";
+    for (const auto &line : old_lines) {
+        const std::string key = line.substr(0, line.find('='));
+        if (!key.empty() && key[0] != '#' && !keys.contains(key))
+            changed += "-" + key + "\n";
+    }
     return changed;
 }
 
@@ -114,35 +102,17 @@ std::string changes(const Files &before, const Files &after) {
     for (const auto &[path, text] : all) {
         const std::string name = fs::path(path).filename();
         if (!after.contains(path))
-            changed += "-" + name + "\n";
+            changed.append("-").append(name).append("\n");
         else if (!before.contains(path))
-            changed += "+" + name + "\n" + changed_lines("", text);
+            changed.append("+").append(name).append("\n").append(changed_lines("", text));
         else if (const auto lines = changed_lines(before.at(path), after.at(path)); !lines.empty())
-            changed += name + "\n" + lines;
+            changed.append(name).append("\n").append(lines);
     }
     return changed;
 }
 
-// ---- This process
-
 int open_descriptors() {
     return static_cast<int>(std::distance(fs::directory_iterator("/proc/self/fd"), {}));
-}
-
-long peak_memory() {
-    struct rusage usage = {};
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss;
-}
-
-Output capture(const std::string &command) {
-    FILE *const pipe = popen(command.c_str(), "r");
-    Output output;
-    for (int c = 0; (c = getc(pipe)) != EOF;)
-        output.text.push_back(static_cast<char>(c));
-    const int status = pclose(pipe);
-    output.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    return output;
 }
 
 // ---- /dev/log
@@ -172,99 +142,60 @@ std::vector<std::string> take_raw_log() {
     return std::exchange(log_datagrams, {});
 }
 
-static std::vector<unit::LogMessage> parse(const std::vector<std::string> &datagrams) {
-    std::vector<unit::LogMessage> messages;
+static std::string log_of(const std::vector<std::string> &datagrams) {
+    std::string log;
     for (const auto &datagram : datagrams) {
-        unit::LogMessage message = unit::parse_log_datagram(datagram);
-        EXPECT_EQ(message.priority & ~LOG_PRIMASK, LOG_LOCAL0) << datagram;
-        EXPECT_NE(message.text, datagram) << "has not the form of a message";
-        message.priority = LOG_PRI(message.priority);
-        messages.push_back(message);
+        const unit::LogMessage message = unit::parse_log_datagram(datagram);
+        log += std::to_string(LOG_PRI(message.priority)) + " " + message.text + "\n";
     }
-    return messages;
+    return log;
 }
 
 std::string take_log() {
-    std::string log;
-    for (const auto &message : parse(take_raw_log()))
-        log += std::to_string(message.priority) + " " + message.text + "\n";
-    return log;
+    return log_of(take_raw_log());
 }
 
 std::string take_log(int priority) {
     std::string log;
-    for (const auto &message : parse(take_raw_log()))
-        if (message.priority <= priority)
+    for (const auto &datagram : take_raw_log()) {
+        const unit::LogMessage message = unit::parse_log_datagram(datagram);
+        if (LOG_PRI(message.priority) <= priority)
             log += message.text + "\n";
+    }
     return log;
 }
 
 testing::AssertionResult logged(int priority, const std::string &text) {
     const std::lock_guard lock(log_mutex);
     drain();
-    testing::AssertionResult missing = testing::AssertionFailure();
-    missing << "not logged: " << priority << " " << text << "\nbut:\n";
-    for (const auto &message : parse(log_datagrams)) {
-        if (message.priority == priority && message.text == text)
-            return testing::AssertionSuccess();
-        missing << message.priority << " " << message.text << "\n";
-    }
-    return missing;
+    const std::string log = "\n" + log_of(log_datagrams);
+    const std::string line = "\n" + std::to_string(priority) + " " + text + "\n";
+    return testing::AssertionResult(log.find(line) != std::string::npos)
+           << "not" << line << "but" << log;
 }
 
 // ---- Scripted surrogate parent
 
 // Reads until `lines` line feeds came, or the end.
-bool ScriptedSurrogate::await(int connection, long lines) {
-    char bytes[4096];
-    while (lines > 0) {
-        const ssize_t length = recv(connection, bytes, sizeof bytes, 0);
-        if (length <= 0)
-            return false;
-        lines -= std::count(bytes, bytes + length, '\n');
-        received_.append(bytes, static_cast<size_t>(length));
-    }
-    return true;
+void ScriptedSurrogate::await(int connection, int lines) {
+    for (char c = 0; lines > 0 && recv(connection, &c, 1, 0) == 1; lines -= c == '\n')
+        received_ += c;
 }
 
-static void trickle(int connection, const std::string &text) {
-    const int on = 1;
-    setsockopt(connection, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
-    if (text.size() > 100)
-        unit::say(connection, text);
-    else
-        for (const char c : text)
-            unit::say(connection, {c});
-}
-
-void ScriptedSurrogate::converse(int connection) {
-    if (!await(connection, 2))
-        return;
-    while (unit::say(connection, reply_) && then_ == Then::flood)
-        continue;
-    if (then_ == Then::close || then_ == Then::flood)
-        return;
-    if (then_ != Then::hold) {
-        if (!await(connection, 1))
-            return;
-        trickle(connection, output_);
-        if (then_ == Then::await_start)
-            return;
-        shutdown(connection, SHUT_WR);
-    }
-    while (await(connection, 1))
-        continue;
-}
-
+// To a client that is gone it says the rest in vain.
 void ScriptedSurrogate::serve() {
-    sigset_t all; // signals are for the test's own thread
-    sigfillset(&all);
-    pthread_sigmask(SIG_BLOCK, &all, nullptr);
-    const struct timeval patience = {5, 0}; // with a client that never closes
     for (int connection; (connection = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC)) >= 0;) {
         const std::lock_guard lock(mutex_);
-        setsockopt(connection, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience);
-        converse(connection);
+        await(connection, 2);
+        unit::say(connection, reply_);
+        if (then_ != Then::close) {
+            await(connection, 1);
+            unit::say(connection, output_);
+        }
+        if (then_ == Then::await_kill) {
+            shutdown(connection, SHUT_WR);
+            await(connection, 1);
+        }
         close(connection);
     }
 }

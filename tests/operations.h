@@ -20,28 +20,15 @@ struct Records {
     vlsys_dns dns;
 };
 
-// What an operation returns when one of its calls fails.
-enum class Failure {
-    never,          // it always returns its good result
-    errno_value,    // the call's errno
-    errno_or_enxio, // the same, but ENXIO when the interfaces cannot be listed
-    negative_errno, // the same, negated
-    minus_one,      // -1
-    zero,           // 0
-    mixed           // errno_value, negative_errno or minus_one, as the step has it
-};
-
-enum class Trait { none, starts_library, logs_nothing };
-
 struct Operation {
     const char *name;
     long good; // its result when all is well
-    Failure failure;
-    const char *replaces; // the names of the files that it changes, "" for none
-    // The calls whose failure leaves it with the good result, and less done or read.
-    const char *passes_over;
+    // Its results when a call fails, as the header has them ("errno", "-errno", "ENXIO", a number),
+    // and "silent" when it then logs nothing.
+    const char *failure;
     std::function<long(Records &)> run;
-    Trait trait = Trait::none;
+    // The calls whose failure leaves it with the good result, and less done or read.
+    const char *passes_over = "";
 };
 
 extern const std::vector<Operation> operations;

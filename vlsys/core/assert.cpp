@@ -6,8 +6,9 @@
 #if defined(_GLIBCXX_ASSERTIONS) && defined(_GLIBCXX_VERBOSE_ASSERT)
 
 // Weak: a program that is linked with the static library may bring its own.
-[[gnu::weak]] void std::__glibcxx_assert_fail(const char *, int, const char *,
-                                              const char *) noexcept {
+[[gnu::weak]] void std::__glibcxx_assert_fail(const char * /*file*/, int /*line*/,
+                                              const char * /*function*/,
+                                              const char * /*condition*/) noexcept {
     abort();
 }
 
