@@ -339,7 +339,7 @@ static int check_network(Network *network, vlsys_gw4 *gw4, vlsys_gw6 *gw6, vlsys
 
 template <class Subnet>
 static Owned<Subnet[]> allocate(const char *name, int count) {
-    void *const table = calloc(sizeof(Subnet), static_cast<size_t>(count));
+    void *const table = calloc(static_cast<size_t>(count), sizeof(Subnet));
     if (!table)
         log_errno("%s = calloc(%d, %d", name, static_cast<int>(sizeof(Subnet)), count);
     return Owned<Subnet[]>(static_cast<Subnet *>(table));
