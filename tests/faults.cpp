@@ -170,7 +170,7 @@ static Word fail(const Calls &kind, int error) {
     return kind.failure;
 }
 
-static const Calls &find_kind(const std::string &name) {
+static const Calls &find_kind(const char *name) {
     static std::map<std::string, const Calls *> kinds;
     if (kinds.empty()) {
         for (const Calls &kind : calls) {
