@@ -94,7 +94,7 @@ struct Row {
     Validators validators;
     string setting;     // what is unlike the start
     const char *result; // the code in words
-    string after = {};  // what has changed
+    string after;       // what has changed
 };
 
 static void expect(Validators validator, const Row &row) {
