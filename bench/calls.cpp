@@ -22,8 +22,10 @@ namespace {
 template <class Call>
 void measure(State &state, Call call) {
     for (auto _ : state)
-        if (!call())
-            return state.SkipWithError("failed");
+        if (!call()) {
+            state.SkipWithError("failed");
+            return;
+        }
 }
 
 // ---- Edit

@@ -20,6 +20,7 @@ inline std::vector<std::string> lines_of(const std::string &text) {
     return lines;
 }
 
+// NOLINTNEXTLINE(misc-definitions-in-headers): a target is one source file
 extern "C" int LLVMFuzzerTestOneInput(const char *data, size_t size) {
     vlsys_setlogmask(LOG_MASK(LOG_EMERG));
     feed({data, size});
