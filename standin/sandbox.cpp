@@ -235,7 +235,7 @@ void make_unit_files(const char *kind_name) {
 
 static void add_interface(const std::string &name) {
     run("ip link add " + name + " type veth peer name " + name + " netns outside && ip link set " +
-        name + " up && ip -n outside link set " + name + " up");
+        name + " up && nsenter --net=/run/netns/outside ip link set " + name + " up");
 }
 
 void set_interfaces(const std::vector<std::string> &names) {

@@ -14,8 +14,8 @@ namespace unit {
 //   /etc, /usr/bin, /usr/sbin and /dev begin as mirrors of the machine's, /run, /proc/driver and
 //   /var/cache begin empty;
 // - lo is up, /sys shows the unit's interfaces, and a second network namespace, "outside", holds
-// the
-//   other ends of the interfaces (`ip -n outside ...`) and forwards, as a router does.
+//   the other ends of the interfaces and forwards, as a router does. A command runs there by
+//   `nsenter --net=/run/netns/outside`; `ip -n` needs a /sys that can be written.
 void enter_namespaces();
 
 // Puts the unit's files in place afresh: network files, clock file, link to the zone file, version
