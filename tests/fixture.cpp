@@ -1,32 +1,26 @@
 #include "fixture.h"
 
+#include "core/owners.h"
 #include "standin/log.h"
 #include "standin/loopback.h"
 #include "vlsys.h"
 
 #include <algorithm>
+#include <climits>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <mutex>
 #include <poll.h>
 #include <set>
 #include <sstream>
 #include <sys/socket.h>
+#include <thread>
 #include <unistd.h>
 
 namespace fs = std::filesystem;
 
 namespace test {
-
-Output capture(const std::string &command) {
-    FILE *const pipe = popen(command.c_str(), "r");
-    Output output;
-    for (int c = 0; (c = getc(pipe)) != EOF;)
-        output.text.push_back(static_cast<char>(c));
-    const int status = pclose(pipe);
-    output.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    return output;
-}
 
 std::string read_file(const std::string &path) {
     const std::ifstream file(path);
@@ -40,32 +34,23 @@ void write_file(const std::string &path, const std::string &content) {
     EXPECT_TRUE((std::ofstream(path) << content).flush()) << "cannot write " << path;
 }
 
-std::string list_directory(const std::string &path) {
-    return capture("ls -A " + path).text;
-}
-
-unsigned mode_of(const std::string &path) {
-    return static_cast<unsigned>(fs::symlink_status(path).permissions());
-}
-
-std::string link_target(const std::string &path) {
-    std::error_code error;
-    return fs::read_symlink(path, error);
-}
-
-static std::string describe(const fs::path &path) {
+static std::string content_of(const fs::path &path) {
     if (fs::is_symlink(path))
-        return "-> " + link_target(path) + "\n";
-    return (mode_of(path) == 0644 ? "" : "its mode is not 0644\n") + read_file(path);
+        return "link to " + fs::read_symlink(path).string() + "\n";
+    const bool is_0644 = fs::status(path).permissions() == fs::perms{0644};
+    return (is_0644 ? "" : "its mode is not 0644\n") + read_file(path);
+}
+
+static bool is_link_to_machine(const fs::path &path) {
+    return fs::is_symlink(path) && fs::read_symlink(path).string().starts_with("/run/host/");
 }
 
 Files unit_files(const std::string &directory) {
     Files files;
     for (const auto &entry : fs::recursive_directory_iterator(directory)) {
-        const bool is_link = entry.is_symlink();
-        const bool is_machines = is_link && link_target(entry.path()).starts_with("/run/host/");
-        if (!is_machines && (is_link || !entry.is_directory()))
-            files[entry.path().lexically_relative(directory)] = describe(entry.path());
+        const bool is_directory = fs::is_directory(entry.symlink_status());
+        if (!is_directory && !is_link_to_machine(entry))
+            files[entry.path().lexically_relative(directory)] = content_of(entry);
     }
     return files;
 }
@@ -85,12 +70,12 @@ static std::string changed_lines(const std::string &before, const std::string &a
     for (const auto &line : lines_of(after)) {
         keys.insert(line.substr(0, line.find('=')));
         if (std::find(old_lines.begin(), old_lines.end(), line) == old_lines.end())
-            changed += "+" + line + "\n";
+            changed += "+" + line + " ";
     }
     for (const auto &line : old_lines) {
         const std::string key = line.substr(0, line.find('='));
         if (!key.empty() && key[0] != '#' && !keys.contains(key))
-            changed += "-" + key + "\n";
+            changed += "-" + key + " ";
     }
     return changed;
 }
@@ -102,20 +87,14 @@ std::string changes(const Files &before, const Files &after) {
     for (const auto &[path, text] : all) {
         const std::string name = fs::path(path).filename();
         if (!after.contains(path))
-            changed.append("-").append(name).append("\n");
+            changed.append("-").append(name).append(" ");
         else if (!before.contains(path))
-            changed.append("+").append(name).append("\n").append(changed_lines("", text));
+            changed.append("+").append(name).append(" ").append(changed_lines("", text));
         else if (const auto lines = changed_lines(before.at(path), after.at(path)); !lines.empty())
-            changed.append(name).append("\n").append(lines);
+            changed.append(name).append(" ").append(lines);
     }
     return changed;
 }
-
-int open_descriptors() {
-    return static_cast<int>(std::distance(fs::directory_iterator("/proc/self/fd"), {}));
-}
-
-// ---- /dev/log
 
 static int log_receiver;
 static std::mutex log_mutex;
@@ -127,9 +106,10 @@ static void drain() {
         log_datagrams.push_back(datagram);
 }
 
-// The socket holds little: whoever logs should not have to wait for the test to take it.
+// The socket holds few messages. It is emptied all the time, so that nobody who logs has to wait.
 static void collect() {
-    for (struct pollfd ready = {log_receiver, POLLIN, 0};;) {
+    struct pollfd ready = {log_receiver, POLLIN, 0};
+    for (;;) {
         poll(&ready, 1, -1);
         const std::lock_guard lock(log_mutex);
         drain();
@@ -138,89 +118,62 @@ static void collect() {
 
 std::vector<std::string> take_raw_log() {
     const std::lock_guard lock(log_mutex);
-    drain(); // what was sent before is there
+    drain(); // the collector may not have come to it yet
     return std::exchange(log_datagrams, {});
-}
-
-static std::string log_of(const std::vector<std::string> &datagrams) {
-    std::string log;
-    for (const auto &datagram : datagrams) {
-        const unit::LogMessage message = unit::parse_log_datagram(datagram);
-        log += std::to_string(LOG_PRI(message.priority)) + " " + message.text + "\n";
-    }
-    return log;
-}
-
-std::string take_log() {
-    return log_of(take_raw_log());
 }
 
 std::string take_log(int priority) {
     std::string log;
     for (const auto &datagram : take_raw_log()) {
         const unit::LogMessage message = unit::parse_log_datagram(datagram);
-        if (LOG_PRI(message.priority) <= priority)
-            log += message.text + "\n";
+        if (const int level = LOG_PRI(message.priority); level <= priority)
+            log += std::to_string(level) + " " + message.text + "\n";
     }
     return log;
 }
 
 testing::AssertionResult logged(int priority, const std::string &text) {
-    const std::lock_guard lock(log_mutex);
-    drain();
-    const std::string log = "\n" + log_of(log_datagrams);
+    const std::string log = "\n" + take_log();
     const std::string line = "\n" + std::to_string(priority) + " " + text + "\n";
     return testing::AssertionResult(log.find(line) != std::string::npos)
            << "not" << line << "but" << log;
 }
 
-// ---- Scripted surrogate parent
-
-// Reads until `lines` line feeds came, or the end.
-void ScriptedSurrogate::await(int connection, int lines) {
-    for (char c = 0; lines > 0 && recv(connection, &c, 1, 0) == 1; lines -= c == '\n')
-        received_ += c;
-}
-
-// To a client that is gone it says the rest in vain.
-void ScriptedSurrogate::serve() {
-    for (int connection; (connection = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC)) >= 0;) {
-        const std::lock_guard lock(mutex_);
-        await(connection, 2);
-        unit::say(connection, reply_);
-        if (then_ != Then::close) {
-            await(connection, 1);
-            unit::say(connection, output_);
-        }
-        if (then_ == Then::await_kill) {
-            shutdown(connection, SHUT_WR);
-            await(connection, 1);
-        }
-        close(connection);
+static std::string receive(int connection, int lines) {
+    std::string text;
+    char c = 0;
+    while (lines > 0 && recv(connection, &c, 1, 0) == 1) {
+        text += c;
+        lines -= c == '\n' ? 1 : 0;
     }
+    return text;
 }
 
-ScriptedSurrogate::ScriptedSurrogate(std::string reply, Then then, std::string output)
-    : reply_(std::move(reply)), then_(then), output_(std::move(output)),
-      listener_(unit::listen_on_loopback()), thread_(&ScriptedSurrogate::serve, this) {}
-
-ScriptedSurrogate::~ScriptedSurrogate() {
-    shutdown(listener_, SHUT_RD); // ends the thread's accept
-    thread_.join();
-    close(listener_);
+std::future<std::string> answer(const std::string &reply, const std::string &output) {
+    const int listener = unit::listen_on_loopback();
+    return std::async(std::launch::async, [=] {
+        const vlsys::Fd connection(accept4(listener, nullptr, nullptr, SOCK_CLOEXEC));
+        close(listener);
+        std::string received = receive(connection.get(), 2);
+        unit::say(connection.get(), reply);
+        if (!output.empty()) {
+            received += receive(connection.get(), 1);
+            unit::say(connection.get(), output);
+        }
+        shutdown(connection.get(), SHUT_WR);
+        return received + receive(connection.get(), INT_MAX);
+    });
 }
-
-std::string ScriptedSurrogate::received() {
-    const std::lock_guard lock(mutex_);
-    return received_;
-}
-
-// ---- Fixture
 
 static int descriptors_at_start;
 
+static int open_descriptors() {
+    return static_cast<int>(std::distance(fs::directory_iterator("/proc/self/fd"), {}));
+}
+
 void Unit::SetUp() {
     unit::make_unit_files("sy");
+    set_interfaces({"eth0", "eth1"});
     ASSERT_EQ(vlsys_init(), 0);
     take_log();
     take_waits();

@@ -12,67 +12,50 @@ int factory_main(); // the tool
 
 namespace test {
 
-static const vlsys_ifconf manual = {
-    .name = "eth0",
-    .addr = "192.168.0.10",
-    .netmask = "255.255.255.0",
-    .prefix = 24,
-    .ipv4_mode = VLSYS_MODE_MANUAL,
-    .addr6 = {{.addr = "2001:db8::5", .prefix = 64}},
-    .ipv6_mode = VLSYS_MODE_MANUAL,
+const Records given = {
+    .text = "unit",
+    .nifs = {{.name = "eth0",
+              .addr = "192.168.0.10",
+              .netmask = "255.255.255.0",
+              .prefix = 24,
+              .ipv4_mode = VLSYS_MODE_MANUAL,
+              .addr6 = {{.addr = "2001:db8::5", .prefix = 64}},
+              .ipv6_mode = VLSYS_MODE_MANUAL},
+             {.name = "eth1", .ipv4_mode = VLSYS_MODE_DHCP}},
+    .gw4 = {.iface = "eth0", .addr = "192.168.0.2", .mode = VLSYS_MODE_MANUAL},
+    .gw6 = {.iface = "eth0", .addr = "2001:db8::2", .mode = VLSYS_MODE_MANUAL},
+    .dns = {.domain = "example.com",
+            .server = {"192.168.0.2", "2001:db8::2"},
+            .iface = "eth0",
+            .mode = VLSYS_MODE_MANUAL},
 };
-static const vlsys_gw4 learnt_gw4 = {.iface = "eth0", .mode = VLSYS_MODE_DHCP};
 
-static void fill(Records &records) {
-    records = {
-        .text = "unit",
-        .nifs = {manual, {.name = "eth1", .ipv4_mode = VLSYS_MODE_DHCP}},
-        .gw4 = {.iface = "eth0", .addr = "192.168.0.1", .mode = VLSYS_MODE_MANUAL},
-        .gw6 = {.iface = "eth0", .addr = "2001:db8::1", .mode = VLSYS_MODE_MANUAL},
-        .dns = {.domain = "example.com",
-                .server = {"192.168.0.1", "2001:db8::1"},
-                .iface = "eth0",
-                .mode = VLSYS_MODE_MANUAL},
-    };
-}
-
-static long check_one(Records &r) {
-    fill(r);
+int check_one(Records &r) {
     return vlsys_address_check(r.nifs, r.gw4.addr, r.gw6.addr, &r.dns, r.text);
 }
 
-static long check_two(Records &r) {
-    fill(r);
+int check_both(Records &r) {
     return vlsys_address_check2(r.nifs, 2, &r.gw4, &r.gw6, &r.dns, r.text);
 }
 
-static long set_network(Records &r) {
-    fill(r);
-    return vlsys_set_network(r.nifs, 2, &r.gw4, &r.gw6, &r.dns, r.text, nullptr);
+int set_network(Records &r) {
+    return vlsys_set_network(r.nifs, 2, &r.gw4, &r.gw6, &r.dns, r.text, &r.step);
 }
 
-static long set_dns(Records &r) {
-    fill(r);
-    return vlsys_set_dns_settings(&r.dns);
-}
-
-static long set_ipv6_gateway(Records &r) {
-    fill(r);
-    return vlsys_set_ipv6_default_gateway2(&r.gw6);
+static long learn_ipv4_gateway(Records &r) {
+    r.gw4.mode = VLSYS_MODE_DHCP;
+    return vlsys_set_ipv4_default_gateway2(&r.gw4);
 }
 
 static long start(Records &r) {
     const int result = vlsys_init();
     vlsys_get_path_data(r.text, sizeof r.text);
-    vlsys_exit();
     return result;
 }
 
-static long list_interfaces(Records &r) {
+static long list_interfaces(Records & /*r*/) {
     char(*names)[VLSYS_IFNAME_SIZE] = nullptr;
     const int count = vlsys_get_ifname_list(&names);
-    for (int i = 0; i < count && i < 4; i++)
-        vlsys_strlcpy(r.names[i], names[i], VLSYS_IFNAME_SIZE);
     free(names);
     return count;
 }
@@ -101,29 +84,12 @@ static long spawn_and_wait(Records & /*r*/) {
     return child < 0 ? child : status;
 }
 
-static long read_version(Records &r) {
-    time_t when = 0;
-    vlsys_get_version(r.text, sizeof r.text, &when);
-    return 0;
-}
-
-// The bits that say why not are no failure of a call.
-static long scan_boards(Records & /*r*/) {
-    const int boards = vlsys_avio_scan_alive();
-    return boards == VLSYS_AVIO_NO_DRIVER || boards == 0 ? -1 : boards;
-}
-
-static long run_tool(Records & /*r*/) {
-    const int result = factory_main();
-    vlsys_exit(); // as the process would end
-    return result;
-}
-
-// No surrogate parent listens in a network of one's own.
+// Runs an operation in a network of its own, where no surrogate parent listens.
 template <class Run>
 static auto alone(Run run) {
     return [run](Records &r) {
-        unshare(CLONE_NEWNET);
+        if (unshare(CLONE_NEWNET) != 0)
+            abort();
         return run(r);
     };
 }
@@ -137,17 +103,17 @@ const std::vector<Operation> operations = {
     {"get_utc_offset", 5, "0", [](auto &r) { return vlsys_get_utc_offset(r.text, 9); }},
 
     {"get_ifname_list", 2, "0", list_interfaces},
-    {"set_netif", 0, "errno", [](auto &) { return vlsys_set_netif("eth0", &manual); }},
+    {"set_netif", 0, "errno", [](auto &r) { return vlsys_set_netif("eth0", r.nifs); }},
     {"get_netif", 0, "errno", [](auto &r) { return vlsys_get_netif("eth0", r.nifs); },
      "fopen reading"},
-    {"set_dns_settings", 0, "errno ENXIO", set_dns},
+    {"set_dns_settings", 0, "errno ENXIO", [](auto &r) { return vlsys_set_dns_settings(&r.dns); }},
     {"get_dns_settings", 0, "errno", [](auto &r) { return vlsys_get_dns_settings(&r.dns); },
      "if_nameindex calloc"},
-    {"set_ipv4_default_gateway2", 0, "errno",
-     [](auto &) { return vlsys_set_ipv4_default_gateway2(&learnt_gw4); }, "if_nameindex calloc"},
+    {"set_ipv4_default_gateway2", 0, "errno", learn_ipv4_gateway, "if_nameindex calloc"},
     {"get_ipv4_default_gateway2", 0, "errno",
      [](auto &r) { return vlsys_get_ipv4_default_gateway2(&r.gw4); }},
-    {"set_ipv6_default_gateway2", 0, "errno", set_ipv6_gateway, "if_nameindex calloc"},
+    {"set_ipv6_default_gateway2", 0, "errno",
+     [](auto &r) { return vlsys_set_ipv6_default_gateway2(&r.gw6); }, "if_nameindex calloc"},
     {"get_ipv6_default_gateway2", 0, "errno",
      [](auto &r) { return vlsys_get_ipv6_default_gateway2(&r.gw6); }},
     {"set_hostname", 0, "errno", [](auto &) { return vlsys_set_hostname("unit"); }},
@@ -157,7 +123,7 @@ const std::vector<Operation> operations = {
     {"network_restart", 0, "errno -errno -1", [](auto &) { return vlsys_network_restart(); },
      "unlink"},
     {"address_check", 0, "errno", check_one, "getnameinfo"},
-    {"address_check2", 0, "errno", check_two, "getnameinfo"},
+    {"address_check2", 0, "errno", check_both, "getnameinfo"},
     {"set_network", 0, "errno ENXIO", set_network, "getnameinfo if_nameindex calloc"},
 
     {"surrogate_connect", 0, "-1", connect_and_close},
@@ -171,22 +137,25 @@ const std::vector<Operation> operations = {
 
     {"avio_read_config", 0, "-1", [](auto &) { return vlsys_avio_read_config(); }},
     {"avio_get_config", 0, "-1", [](auto &) { return vlsys_avio_get_config(VLSYS_AVIO_KRD31); }},
-    {"avio_scan_alive", VLSYS_AVIO_READY, "-1", scan_boards},
+    // No board, or VLSYS_AVIO_NO_DRIVER.
+    {"avio_scan_alive", VLSYS_AVIO_READY, "0 1024", [](auto &) { return vlsys_avio_scan_alive(); }},
     {"avio_wait_ready", 1, "0", [](auto &) { return vlsys_avio_wait_ready(); }},
     {"get_destination", 2, "", [](auto &r) { return vlsys_get_destination(r.text, 9); }},
     {"get_fps", 59, "", [](auto &) { return vlsys_get_fps(); }},
     {"get_hdcp_capability", 1, "0", [](auto &) { return vlsys_get_hdcp_capability(); }},
     {"get_serial_number", 8, "-errno", [](auto &r) { return vlsys_get_serial_number(r.text, 9); }},
-    {"get_version", 0, "", read_version, "fopen fstat reading"},
+    {"get_version", 0, "", [](auto &r) { return vlsys_get_version(r.text, 9, &r.time), 0; },
+     "fopen fstat reading"},
 
     {"mkdir", 0, "-1", [](auto &) { return vlsys_mkdir("/run/tree/a/b", 0755); }},
+    // When it is run again, the tree is gone.
     {"remove_tree", 0, "errno",
      [](auto &) { return access("/run/tree", F_OK) ? 0 : vlsys_remove_tree("/run/tree"); }},
     {"realpath", 8, "-errno", [](auto &r) { return vlsys_realpath(r.text, "/run/../run/sda", 9); }},
     {"get_block_device_size", 4096, "-errno",
      [](auto &) { return vlsys_get_block_device_size("/run/sda"); }},
 
-    {"tool", 0, "-1", run_tool, "if_nameindex calloc"},
+    {"tool", 0, "-1", [](auto &) { return factory_main(); }, "if_nameindex calloc"},
 };
 
 void PrintTo(const Operation &operation, std::ostream *stream) {
@@ -194,7 +163,6 @@ void PrintTo(const Operation &operation, std::ostream *stream) {
 }
 
 void prepare_operations() {
-    set_interfaces({"eth0", "eth1"});
     run("for name in eth0 eth1; do"
         "    ip link set $name addrgenmode none && ip -6 addr flush dev $name;"
         " done;"
@@ -210,8 +178,9 @@ void prepare_operations() {
 
 void reset_files() {
     unit::make_unit_files("sy");
+    fs::last_write_time("/etc/velmora-version", fs::file_time_type()); // the same each time
     fs::remove("/etc/localtime.new");
-    fs::remove_all("/etc/sysctl.d"); // is made anew
+    fs::remove_all("/etc/sysctl.d"); // a setter makes it
     for (const char *command : {"/usr/bin/fc-cache", "/usr/sbin/service"}) {
         fs::remove(command);
         fs::create_symlink("/usr/bin/true", command);

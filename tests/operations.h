@@ -1,5 +1,4 @@
-// Every public operation that touches a file, the kernel, memory or a socket, for what is tested
-// with all of them.
+// Every public operation that touches a file, the kernel, memory or a socket.
 #pragma once
 
 #include "vlsys.h"
@@ -10,15 +9,16 @@
 
 namespace test {
 
-// What an operation reads into.
 struct Records {
     char text[VLSYS_PATH_SIZE];
-    char names[4][VLSYS_IFNAME_SIZE];
     vlsys_ifconf nifs[2];
     vlsys_gw4 gw4;
     vlsys_gw6 gw6;
     vlsys_dns dns;
+    time_t time;
+    int step;
 };
+extern const Records given; // what each operation is given; readers write over it
 
 struct Operation {
     const char *name;
@@ -34,9 +34,13 @@ struct Operation {
 extern const std::vector<Operation> operations;
 void PrintTo(const Operation &operation, std::ostream *stream); // its name, in test reports
 
-// Around them: two interfaces with addresses and routes, and the files, afresh. They need a
-// surrogate parent that answers 0 to everything.
+// Gives the operations what they need: addresses and routes, and a disk.
 void prepare_operations();
+// Puts the files that they read and change back in place.
 void reset_files();
+
+int check_one(Records &r);
+int check_both(Records &r);
+int set_network(Records &r);
 
 } // namespace test

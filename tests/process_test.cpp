@@ -1,4 +1,3 @@
-// Commands, run directly and by the surrogate parent.
 #include "fixture.h"
 #include "vlsys.h"
 
@@ -6,9 +5,9 @@
 #include <csignal>
 #include <cstring>
 #include <sys/wait.h>
+#include <unistd.h>
 
 using namespace test;
-using Then = ScriptedSurrogate::Then;
 
 using Process = Unit;
 
@@ -21,79 +20,89 @@ TEST_F(Process, AStatusTextSaysHowTheCommandEnded) {
 }
 
 TEST_F(Process, ADirectStartLeavesTheSignalsAlone) {
-    sigset_t mask = {};
-    sigaddset(&mask, SIGUSR1);
-    sigprocmask(SIG_SETMASK, &mask, nullptr);
-    const std::map<const char *, int> statuses = {
-        {"kill -INT $$; :", SIGINT},
-        {"kill -QUIT $$; :", SIGQUIT},
-        {"exec grep -q 'SigBlk:.0*200$' /proc/self/status", 0},
-    };
-    for (const auto &[command, expected] : statuses) {
-        int status = 0;
-        take_raw_log();
-        waitpid(vlsys_spawn_direct(command), &status, 0);
-        EXPECT_EQ(status & ~WCOREFLAG, expected) << command;
-        EXPECT_EQ(signal(SIGINT, SIG_DFL), SIG_DFL) << command;
-        EXPECT_EQ(signal(SIGQUIT, SIG_DFL), SIG_DFL) << command;
-        EXPECT_EQ(take_raw_log().size(), 2U) << "the child logs nothing";
-    }
+    // Prints the blocked and the ignored signals from 1 to 28; libc uses some of the higher ones.
+    const std::string signals =
+        "sed -En 's/^(SigBlk|SigIgn).*(.{7})$/\\1 \\2/p' /proc/self/status >/run/";
+    const std::string command = signals + "child";
+    const pid_t child = vlsys_spawn_direct(command.c_str());
+    waitpid(child, nullptr, 0);
+    EXPECT_EQ(take_log(), "7 CMD: " + command + "\n7 pid: " + std::to_string(child) + "\n");
+    run(signals + "expected");
+    EXPECT_EQ(read_file("/run/child"), read_file("/run/expected"));
+    EXPECT_EQ(signal(SIGINT, SIG_DFL), SIG_DFL);
+    EXPECT_EQ(signal(SIGQUIT, SIG_DFL), SIG_DFL);
+    sigset_t mask;
+    sigprocmask(SIG_BLOCK, nullptr, &mask);
+    EXPECT_FALSE(sigismember(&mask, SIGCHLD));
+}
+
+TEST_F(Process, ARefusedConnectionIsQuietWhenAsked) {
+    EXPECT_EQ(vlsys_surrogate_connect(1, VLSYS_SURROGATE_PORT), 0);
+    EXPECT_EQ(take_log(), "");
 }
 
 TEST_F(Process, AReplyIsOneNumber) {
     const struct {
-        std::string reply;
-        int result;
-        int error;
+        const char *why, *reply;
+        int result, error;
     } rows[] = {
-        {"256\n", 256, 0},     {"-1\n", -1, EPROTO}, {"2147483648\n", INT_MAX, 0},
-        {"12a\n", -1, EPROTO}, {"\n", -1, EPROTO},   {"", -1, ECONNRESET},
+        {"a number above int's", "2147483648\n", INT_MAX, 0},
+        {"a number below zero", "-1\n", -1, EPROTO},
+        {"more than a number", "12a\n", -1, EPROTO},
+        {"no number", "\n", -1, EPROTO},
+        {"no reply", "", -1, ECONNRESET},
     };
-    ASSERT_EQ(chdir("/run"), 0);
     for (const auto &row : rows) {
-        ScriptedSurrogate surrogate(row.reply, Then::close);
+        const auto request = answer(row.reply);
         errno = 0;
-        EXPECT_EQ(vlsys_system("a b"), row.result) << row.reply;
-        EXPECT_EQ(errno, row.error) << row.reply;
-        errno = 0;
-        EXPECT_EQ(vlsys_spawn("a b"), row.result) << row.reply;
-        EXPECT_EQ(errno, row.error) << row.reply;
-        EXPECT_EQ(surrogate.received(), "/run\na b\n/run\na b &\n");
+        EXPECT_EQ(vlsys_system("a b"), row.result) << row.why;
+        EXPECT_EQ(errno, row.error) << row.why;
     }
 }
 
-TEST_F(Process, APipeReadIsStartedReadAndKilled) {
-    const std::string longest(1023 - strlen("/\n |\n"), 'x');
-    ASSERT_EQ(chdir("/"), 0);
-    ScriptedSurrogate surrogate("\n4711\n", Then::await_kill, "out\n256\n");
-    EXPECT_EQ(vlsys_popen((longest + "x").c_str()), nullptr);
-    EXPECT_EQ(errno, E2BIG);
-    FILE *const stream = vlsys_popen(longest.c_str());
-    EXPECT_EQ(getc(stream), 'o');
-    fail_call("nanosleep", 1, EINTR);
-    EXPECT_EQ(vlsys_pclose(stream), 0);
-    EXPECT_EQ(take_waits(), (std::vector<int64_t>{second, 1})) << "it sleeps on after a signal";
-    EXPECT_EQ(surrogate.received(), "/\n" + longest + " |\nstart\nkill\n");
+TEST_F(Process, ACommandIsSentWithTheWorkingDirectory) {
+    ASSERT_EQ(chdir("/run"), 0);
+    auto request = answer("256\n");
+    EXPECT_EQ(vlsys_system("a b"), 256);
+    EXPECT_EQ(request.get(), "/run\na b\n");
+    request = answer("256\n");
+    EXPECT_EQ(vlsys_spawn("a b"), 256);
+    EXPECT_EQ(request.get(), "/run\na b &\n");
+    EXPECT_EQ(take_log(), "7 CWD: /run\n6 CMD: a b\n7 \"a b\" returned 1\n"
+                          "7 CWD: /run\n6 CMD: a b\n7 received 256\n\n7 \"a b\" pid: 256\n");
 }
 
-TEST_F(Process, WhatIsNoCommandIsNotSent) {
-    run("mkdir '/run/a\ntouch pwned; #'");
-    ScriptedSurrogate surrogate("0\n", Then::close);
+TEST_F(Process, APipeReadIsStartedReadAndKilled) {
+    const std::string longest(1019 - strlen("/"), 'x');
+    ASSERT_EQ(chdir("/"), 0);
+    auto request = answer("\n4711\n", "out\n256\n");
+    FILE *const stream = vlsys_popen(longest.c_str());
+    EXPECT_TRUE(logged(LOG_INFO, "pid: 4711"));
+    EXPECT_EQ(getc(stream), 'o');
+    interrupt_next_wait();
+    EXPECT_EQ(vlsys_pclose(stream), 0);
+    EXPECT_EQ(take_waits(), (std::vector<int64_t>{second, 1})) << "it goes on after a signal";
+    EXPECT_EQ(request.get(), "/\n" + longest + " |\nstart\nkill\n");
+}
+
+TEST_F(Process, WhatIsNoRequestIsNotSent) {
     EXPECT_EQ(vlsys_system(nullptr), -1);
     EXPECT_EQ(vlsys_spawn(nullptr), -1);
     EXPECT_EQ(vlsys_popen(nullptr), nullptr);
     EXPECT_EQ(vlsys_spawn_direct(nullptr), -1);
+    auto request = answer("0\n");
     EXPECT_EQ(vlsys_system("a\nb"), -1);
     EXPECT_EQ(errno, EINVAL);
+    EXPECT_EQ(request.get(), "");
+    request = answer("0\n");
+    ASSERT_EQ(chdir("/"), 0);
+    EXPECT_EQ(vlsys_popen(std::string(1019, 'x').c_str()), nullptr) << "too long";
+    EXPECT_EQ(errno, E2BIG);
+    EXPECT_EQ(request.get(), "");
+    run("mkdir '/run/a\ntouch pwned; #'");
     ASSERT_EQ(chdir("/run/a\ntouch pwned; #"), 0);
+    request = answer("0\n");
     EXPECT_EQ(vlsys_popen("a"), nullptr);
     EXPECT_EQ(errno, EINVAL);
-    EXPECT_EQ(surrogate.received(), "");
-}
-
-TEST_F(Process, CommandsRunDirectlyWithoutASurrogateParent) {
-    EXPECT_EQ(vlsys_surrogate_connect(1, VLSYS_SURROGATE_PORT), 0) << "not logged when quiet";
-    EXPECT_EQ(vlsys_system("exit 3"), 3 << 8);
-    EXPECT_EQ(take_log(), "3 connect: Connection refused\n"
-                          "4 can't connect surrogate parant. fallback to direct call.\n");
+    EXPECT_EQ(request.get(), "");
 }
