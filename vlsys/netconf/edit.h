@@ -10,7 +10,7 @@ namespace vlsys {
 struct edit_item {
     uint32_t remove; // 1: remove the key; any other value: set it
     const char *key;
-    const char *value; // written as it is, without quotes
+    const char *value; // written as it is, without quotes; not null, even where it is not written
 };
 
 // Rewrites the sysconfig file as a whole, mode 0644; a missing file counts as empty, its directory
