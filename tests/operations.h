@@ -1,7 +1,7 @@
 // Every public operation that touches a file, the kernel, memory or a socket.
 #pragma once
 
-#include "vlsys.h"
+#include "records.h"
 
 #include <functional>
 #include <ostream>
@@ -9,15 +9,6 @@
 
 namespace test {
 
-struct Records {
-    char text[VLSYS_PATH_SIZE];
-    vlsys_ifconf nifs[2];
-    vlsys_gw4 gw4;
-    vlsys_gw6 gw6;
-    vlsys_dns dns;
-    time_t time;
-    int step;
-};
 extern const Records given; // what each operation is given; readers write over it
 
 struct Operation {

@@ -3,83 +3,9 @@
 
 #include <algorithm>
 #include <cstring>
-#include <sstream>
 
 using namespace test;
 using std::string;
-
-struct Field {
-    template <class Member>
-    Field(Member &member) : at(reinterpret_cast<char *>(&member)), size(sizeof member) {}
-    bool is_number() const { return size <= sizeof(uint32_t); }
-    string value() const { return {at, is_number() ? size : strnlen(at, size)}; }
-
-    char *at;
-    size_t size;
-};
-
-// The fields by the names that rows use; those of eth0 have no prefix.
-static std::map<string, Field> fields_of(Records &r) {
-    std::map<string, Field> fields = {{"gw4", r.gw4.addr},          {"gw4.iface", r.gw4.iface},
-                                      {"gw4.mode", r.gw4.mode},     {"gw6", r.gw6.addr},
-                                      {"gw6.iface", r.gw6.iface},   {"gw6.mode", r.gw6.mode},
-                                      {"dns", r.dns.mode},          {"domain", r.dns.domain},
-                                      {"server0", r.dns.server[0]}, {"server1", r.dns.server[1]},
-                                      {"server2", r.dns.server[2]}, {"dns.iface", r.dns.iface},
-                                      {"hostname", r.text},         {"step", r.step}};
-    string owner;
-    for (vlsys_ifconf &nif : r.nifs) {
-        fields.insert({{owner + "name", nif.name},
-                       {owner + "ipv4", nif.ipv4_mode},
-                       {owner + "addr", nif.addr},
-                       {owner + "netmask", nif.netmask},
-                       {owner + "prefix", nif.prefix},
-                       {owner + "broadcast", nif.broadaddr},
-                       {owner + "ipv6", nif.ipv6_mode},
-                       {owner + "addr6", nif.addr6[0].addr},
-                       {owner + "prefix6", nif.addr6[0].prefix}});
-        owner = "eth1.";
-    }
-    return fields;
-}
-
-static void set_field(const Field &field, const string &value) {
-    static const std::map<string, uint32_t> names = {{"Off", VLSYS_MODE_OFF},
-                                                     {"Manual", VLSYS_MODE_MANUAL},
-                                                     {"DHCP", VLSYS_MODE_DHCP},
-                                                     {"Auto", VLSYS_MODE_AUTO},
-                                                     {"Check", VLSYS_STEP_CHECK}};
-    if (!field.is_number()) {
-        vlsys_strlcpy(field.at, value.c_str(), field.size);
-        return;
-    }
-    const auto number =
-        static_cast<uint32_t>(names.contains(value) ? names.at(value) : std::stoul(value));
-    if (field.size == 1)
-        *field.at = static_cast<char>(number);
-    else
-        memcpy(field.at, &number, sizeof number);
-}
-
-// A setting that passes, with these changes. eth0 has fixed addresses of both families; eth1 is
-// off, but has addresses to be switched on.
-static Records make(const string &changes) {
-    static const string start =
-        "name=eth0 ipv4=Manual addr=10.0.0.10 netmask=255.255.255.0 prefix=24 "
-        "broadcast=10.0.0.255 ipv6=Manual addr6=2001:db8::1 prefix6=64 "
-        "eth1.name=eth1 eth1.addr=10.1.0.1 eth1.netmask=255.255.0.0 eth1.prefix=16 "
-        "eth1.broadcast=10.1.255.255 eth1.addr6=fd00::1 eth1.prefix6=64 "
-        "gw4.mode=Manual gw4=10.0.0.9 gw4.iface=eth0 gw6.mode=Manual gw6=fe80::1%eth0 "
-        "dns=Manual domain=a.example server0=10.0.0.9 dns.iface=eth0 hostname=unit ";
-    Records records = {};
-    const auto fields = fields_of(records);
-    std::istringstream words(start + changes);
-    for (string word; words >> word;) {
-        const size_t equals = word.find('=');
-        set_field(fields.at(word.substr(0, equals)), word.substr(equals + 1));
-    }
-    return records;
-}
 
 struct Row {
     const char *why;
@@ -121,6 +47,7 @@ TEST_F(NetworkSetting, BothValidatorsKeepTheCommonRules) {
         {"a link-local address, a long name", "addr6=febf::1%eth0 " + longest, valid},
         {"no scope", "addr6=fe80::1", "eth0: the IPv6 address is missing or not valid"},
         {"beyond global", "addr6=4000::1", "eth0: the IPv6 address is not allowed here"},
+        {"129 bits", "prefix6=129", "eth0: the IPv6 prefix length is out of range"},
         {"no host bit", "prefix6=128", "eth0: the IPv6 address is the address of the network"},
         {"an IPv4 gateway outside", "gw4=10.0.1.1", "the IPv4 gateway cannot be reached"},
         {"the network", "gw4=10.0.0.0", "eth0: the IPv4 gateway is the address of the network"},
@@ -225,6 +152,13 @@ TEST_F(NetworkSetting, SeveralInterfacesMustGoTogether) {
               "3 A setup of DNS is DHCP although no setup of a network interface is DHCP.\n");
 }
 
+TEST_F(NetworkSetting, AFaultIsTextWithoutTheInterfacesToo) {
+    const int overlap = VLSYS_CHECK_CODE(1, VLSYS_CHECK_FIELD_IPV4_ADDR, VLSYS_CHECK_KIND_OVERLAP);
+    char text[160];
+    vlsys_check_text(overlap, nullptr, 0, text, sizeof text);
+    EXPECT_STREQ(text, "interface 2: the IPv4 address is in the subnet of another interface");
+}
+
 // Each row begins with what the one before has left.
 TEST_F(NetworkSetting, ASettingIsWrittenKeyByKey) {
     const struct {
@@ -246,8 +180,8 @@ TEST_F(NetworkSetting, ASettingIsWrittenKeyByKey) {
          "6 IPv4 (eth0): DHCP 6 IPv6 (eth0): DHCP 6 IPv4 (eth1): OFF 6 IPv6 (eth1): AUTO "
          "6 IPv4 GW dhcp 6 IPv6 GW dhcp 6 IPv6 GW auto (eth1) 6 DNS DHCP (eth0) "
          "6 hostname: localhost "},
-        {"a fixed setting", "server1=10.0.0.2 server2=10.0.0.9",
-         "network +HOSTNAME=unit +GATEWAY=10.0.0.9 +IPV6_DEFAULTGW=fe80::1%eth0 "
+        {"a fixed setting", "gw6=2001:db8::9 server1=10.0.0.2 server2=10.0.0.9",
+         "network +HOSTNAME=unit +GATEWAY=10.0.0.9 +IPV6_DEFAULTGW=2001:db8::9 "
          "ifcfg-eth0 +BOOTPROTO=none +IPV6_AUTOCONF=no +IPADDR=10.0.0.10 +NETMASK=255.255.255.0 "
          "+IPV6ADDR=2001:db8::1/64 +DOMAIN=a.example +DNS1=10.0.0.2 +DNS2=10.0.0.9 -DHCPV6C "
          "ifcfg-eth1 +ONBOOT=no +IPV6INIT=no +IPV6_AUTOCONF=no -DEFROUTE "
@@ -256,7 +190,7 @@ TEST_F(NetworkSetting, ASettingIsWrittenKeyByKey) {
          "6 start checking: mode: M_M_MMM44 6 vlsys_address_check2: OK "
          "6 IPv4 (eth0): 10.0.0.10/24 6 IPv6 (eth0): 2001:db8::1/64 "
          "6 IPv4 (eth1): OFF 6 IPv6 (eth1): OFF "
-         "6 IPv4 GW 10.0.0.9 6 IPv6 GW fe80::1%eth0 6 IPv6 GW auto (eth0) 6 IPv6 GW auto (eth1) "
+         "6 IPv4 GW 10.0.0.9 6 IPv6 GW 2001:db8::9 6 IPv6 GW auto (eth0) 6 IPv6 GW auto (eth1) "
          "6 DNS a.example, 10.0.0.2, 10.0.0.9 (eth0) 6 hostname: unit "},
     };
     run("cd /etc/sysconfig/network-scripts;"
@@ -293,7 +227,8 @@ TEST_F(NetworkSetting, ASettingThatNoSetterServesIsNotWritten) {
         expect(
             {"no such mode, or no such list", change, "error 22: Invalid argument", "step=Check"},
             set_network);
-    EXPECT_TRUE(logged(LOG_ERR, "vlsys_set_network: IPv6 gateway: no such mode: 4"));
+    EXPECT_NE(take_log().find("3 vlsys_set_network: IPv6 gateway: no such mode: 4\n"),
+              string::npos);
     run("ip link set eth1 down; ip link set eth1 name '$(x)'; ip link set '$(x)' up");
     expect({"a name that a shell would run", "gw6=fe80::1%$(x)",
             "the IPv6 gateway is missing or not valid", "step=Check"},
