@@ -18,7 +18,7 @@ TEST_F(Core, PathsComeFromTheEnvironmentAtTheStart) {
     setenv("VL_ROOT", "/run/r/", 1);
     setenv("VL_PREFIX", "/p", 1);
     EXPECT_EQ(vlsys_init(), 0);
-    EXPECT_EQ(take_log(LOG_INFO).find("6 vlsys " VLSYS_VERSION " built on 20"), 0U);
+    EXPECT_EQ(take_log(LOG_INFO).find("6 vlsys " VLSYS_VERSION " built on "), 0U);
     setenv("VL_ROOT", "/later", 1);
     EXPECT_EQ(vlsys_init(), 0) << "a second start changes nothing";
     EXPECT_EQ(take_log(), "7 initialized 1 times\n");
@@ -32,30 +32,12 @@ TEST_F(Core, PathsComeFromTheEnvironmentAtTheStart) {
 }
 
 TEST_F(Core, NullArgumentsAreRefusedInSilence) {
-    vlsys_ifconf nif = {};
-    EXPECT_EQ(vlsys_get_timezone(nullptr, 9), 0U);
     EXPECT_EQ(vlsys_set_netif("lo", nullptr), EFAULT);
-    EXPECT_EQ(vlsys_get_netif(nullptr, &nif), EFAULT);
-    EXPECT_EQ(vlsys_set_dns_settings(nullptr), EFAULT);
-    EXPECT_EQ(vlsys_set_ipv4_default_gateway2(nullptr), EFAULT);
-    EXPECT_EQ(vlsys_get_ipv6_default_gateway2(nullptr), EFAULT);
-    EXPECT_EQ(vlsys_get_hostname(nullptr), EFAULT);
+    EXPECT_EQ(vlsys_get_utc_offset(nullptr, 9), 0U);
+    EXPECT_EQ(vlsys_pclose(nullptr), -1);
     EXPECT_EQ(vlsys_address_check(nullptr, nullptr, nullptr, nullptr, nullptr), EFAULT);
-    EXPECT_EQ(vlsys_remove_tree(nullptr), EFAULT);
-    EXPECT_EQ(vlsys_realpath(nullptr, nullptr, 9), -EFAULT);
     EXPECT_EQ(vlsys_get_block_device_size(nullptr), -EFAULT);
     EXPECT_EQ(take_log(), "");
-}
-
-TEST_F(Core, BoundedTextIsCutAndTerminated) {
-    char text[] = "1234567";
-    EXPECT_EQ(vlsys_strlcpy(text, "abcdefghij", 4), 10U);
-    EXPECT_STREQ(text, "abc");
-    EXPECT_STREQ(text + 4, "567") << "nothing is written beyond the size";
-    EXPECT_EQ(vlsys_strlcat(text, "0123456789", 8), 13U);
-    EXPECT_STREQ(text, "abc0123");
-    EXPECT_EQ(vlsys_strlcat(text, "0123456789", 3), 13U);
-    EXPECT_STREQ(text, "abc0123") << "without a NUL within the size, nothing is written";
 }
 
 TEST_F(Core, SystemLogLinesCarryIdentityProcessAndThread) {

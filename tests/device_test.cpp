@@ -17,7 +17,7 @@ static const char status_file[] = "/proc/driver/VlAvio/status";
 TEST_F(Device, ARegisterBelongsToTheBoardAbove) {
     const struct {
         std::string why, status;
-        int alive, result, config;
+        int alive, read, config;
     } rows[] = {
         {"all, in any order", tbx206 + tbx205 + tbx204 + krd31 + "Config :1f\n", 0xef, 0, 0x1f},
         {"too large", krd31 + "Config :100000000\nAlive  :113\n", 0x1, 0, -1},
@@ -30,9 +30,11 @@ TEST_F(Device, ARegisterBelongsToTheBoardAbove) {
     for (const auto &row : rows) {
         write_file(status_file, row.status);
         EXPECT_EQ(vlsys_avio_scan_alive(), row.alive) << row.why;
-        EXPECT_EQ(vlsys_avio_read_config(), row.result) << row.why;
+        EXPECT_EQ(vlsys_avio_read_config(), row.read) << row.why;
+        unlink(status_file); // what was read once is kept
         EXPECT_EQ(vlsys_avio_get_config(VLSYS_AVIO_KRD31), row.config) << row.why;
     }
+    EXPECT_NE(take_log().find("3 unknown device id: DeviceID=9\n"), std::string::npos);
 }
 
 TEST_F(Device, TheRateAndTheDestinationComeFromTheBoards) {
@@ -53,11 +55,16 @@ TEST_F(Device, TheRateAndTheDestinationComeFromTheBoards) {
                           "6 HDCP handling capability: yes\n"
                           "6 Destination: CN\n"
                           "6 FPS: 50\n");
+    EXPECT_EQ(vlsys_get_fps(), 50);
+    EXPECT_EQ(take_log(), "6 Destination: CN\n6 FPS: 50\n") << "they are read once";
     EXPECT_EQ(vlsys_avio_wait_ready(), 0) << "one booted from its backup";
 }
 
 TEST_F(Device, TheWaitEndsAndTellsWhatIsMissing) {
     write_file(status_file, tbx205 + "VendorID=3c2b DeviceID=4161\n");
+    interrupt_next_wait();
+    EXPECT_EQ(vlsys_avio_wait_ready(), 0);
+    EXPECT_EQ(take_waits().size(), 1U) << "a signal ends it";
     EXPECT_EQ(vlsys_avio_wait_ready(), 0);
     EXPECT_EQ(take_waits(), std::vector<int64_t>(959, 29970030)) << "a little under 29 seconds";
     EXPECT_EQ(vlsys_get_fps(), 59);
@@ -73,7 +80,7 @@ TEST_F(Device, TheWaitEndsAndTellsWhatIsMissing) {
 
 TEST_F(Device, TheSerialNumberIsTakenFromTheListing) {
     const struct {
-        std::string why, listing;
+        std::string why, listing; // its last line is the wait status
         int result;
         const char *serial;
     } rows[] = {
@@ -89,7 +96,8 @@ TEST_F(Device, TheSerialNumberIsTakenFromTheListing) {
         const auto request = answer("7\n", row.listing);
         EXPECT_EQ(vlsys_get_serial_number(serial, sizeof serial), row.result) << row.why;
         EXPECT_STREQ(serial, row.serial) << row.why;
-        EXPECT_TRUE(logged(LOG_DEBUG, row.listing.substr(0, row.listing.find('\n')))) << row.why;
+        const std::string line = row.listing.substr(0, row.listing.find('\n'));
+        EXPECT_NE(take_log().find("7 " + line), std::string::npos) << row.why;
     }
 }
 

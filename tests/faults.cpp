@@ -62,7 +62,8 @@ static const Calls reading = {"reading", 0, unchanged, {EIO}, {}};
 
 static thread_local struct {
     Fault fault = Fault::none;
-    int left = 0; // calls up to the struck one; with Fault::failure, their ways to fail
+    int left =
+        0; // counts down by call, with Fault::failure by way to fail; at 1 the next is struck
     Strike *strike = nullptr;
 } plan;
 
@@ -205,7 +206,8 @@ extern "C" int __wrap_nanosleep(const struct timespec *request, struct timespec 
     waits.push_back(request->tv_sec * second + request->tv_nsec);
     if (!std::exchange(is_next_interrupted, false))
         return 0;
-    *remaining = {0, 1};
+    if (remaining)
+        *remaining = {0, 1};
     errno = EINTR;
     return -1;
 }

@@ -8,22 +8,14 @@ using std::string;
 
 using FileUtil = Unit;
 
-TEST_F(FileUtil, TheFontCacheCommandGivesTheResult) {
-    for (const auto &[reply, result] : {std::pair("256\n", 1), {"9\n", 9}, {"-5\n", -EPROTO}}) {
-        const auto request = answer(reply);
-        EXPECT_EQ(vlsys_fc_cache(), result) << reply;
-    }
-}
-
 TEST_F(FileUtil, ADirectoryIsMadeWithItsParents) {
     ASSERT_EQ(chdir("/run"), 0);
     for (const char *path : {"/", "/run/f/g//h/", "a/b"})
         EXPECT_EQ(vlsys_mkdir(path, 0700), 0) << path;
-    run("stat -c %a f/g/h a/b | grep -x 700");
+    run("test $(find f a -perm 700 | wc -l) = 5");
     write_file("file", "");
-    EXPECT_EQ(vlsys_mkdir("file", 0700), 0) << "an entry of another kind is there already";
     EXPECT_EQ(vlsys_mkdir("file/x/y", 0750), -1);
-    EXPECT_TRUE(logged(LOG_ERR, "mkdir(file/x, 0750): Not a directory"));
+    EXPECT_EQ(take_log(), "3 mkdir(file/x, 0750): Not a directory\n");
 }
 
 TEST_F(FileUtil, ATreeIsRemovedWithoutFollowingLinks) {

@@ -9,7 +9,6 @@
 #include <climits>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <mutex>
 #include <poll.h>
 #include <set>
@@ -132,13 +131,6 @@ std::string take_log(int priority) {
     return log;
 }
 
-testing::AssertionResult logged(int priority, const std::string &text) {
-    const std::string log = "\n" + take_log();
-    const std::string line = "\n" + std::to_string(priority) + " " + text + "\n";
-    return testing::AssertionResult(log.find(line) != std::string::npos)
-           << "not" << line << "but" << log;
-}
-
 static std::string receive(int connection, int lines) {
     std::string text;
     char c = 0;
@@ -165,24 +157,16 @@ std::future<std::string> answer(const std::string &reply, const std::string &out
     });
 }
 
-static int descriptors_at_start;
-
-static int open_descriptors() {
-    return static_cast<int>(std::distance(fs::directory_iterator("/proc/self/fd"), {}));
-}
-
 void Unit::SetUp() {
     unit::make_unit_files("sy");
     set_interfaces({"eth0", "eth1"});
     ASSERT_EQ(vlsys_init(), 0);
     take_log();
     take_waits();
-    descriptors_at_start = open_descriptors();
 }
 
 void Unit::TearDown() {
     vlsys_exit();
-    EXPECT_LE(open_descriptors(), descriptors_at_start) << "descriptors left open";
 }
 
 } // namespace test

@@ -34,8 +34,6 @@ std::string changes(const Files &before, const Files &after = unit_files());
 // Takes what was sent to /dev/log since it was last taken, and gives the messages of this priority
 // and of more urgent ones. Each is a line of priority and text: "6 hostname: vl\n".
 std::string take_log(int priority = LOG_DEBUG);
-// Takes the log too, and tells whether one of its messages has this priority and text.
-testing::AssertionResult logged(int priority, const std::string &text);
 // Takes the log as the datagrams that came.
 std::vector<std::string> take_raw_log();
 
@@ -54,7 +52,7 @@ std::future<std::string> answer(const std::string &reply, const std::string &out
 class Unit : public ::testing::Test {
   protected:
     void SetUp() override;
-    void TearDown() override; // calls vlsys_exit; fails when descriptors are left open
+    void TearDown() override; // calls vlsys_exit
 };
 
 } // namespace test

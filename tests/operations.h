@@ -1,4 +1,4 @@
-// Every public operation that touches a file, the kernel, memory or a socket.
+// Every public operation that touches a file, the kernel, memory or a socket; of two forms one.
 #pragma once
 
 #include "records.h"

@@ -11,16 +11,12 @@ using Timezone = Unit;
 static const char clock_file[] = "/etc/sysconfig/clock";
 
 TEST_F(Timezone, TheClockFileGetsTheZoneInEachZoneLine) {
-    const string piece(79, 'x'); // as much as is read at once
     const struct {
         string why, zone, before, after;
     } rows[] = {
         {"ZONE= anywhere in a line", "Asia/Tokyo", "#ZONE=a\n\nTIMEZONE=b\n",
          "ZONE=\"Asia/Tokyo\"\n\nZONE=\"Asia/Tokyo\"\n"},
         {"no zone line, and no line feed at the end", "UTC", "B=2", "B=2\nZONE=\"UTC\"\n"},
-        {"a NUL in a line", "UTC", string("A\0ZON\n", 6), string("A\0ZON\n", 6) + "ZONE=\"UTC\"\n"},
-        {"a long line counts as several", "UTC", piece + "ZONE=1" + piece,
-         piece + "ZONE=\"UTC\"\nxxxxxx"},
     };
     for (const auto &row : rows) {
         write_file(clock_file, row.before);
@@ -49,13 +45,12 @@ TEST_F(Timezone, AFailureChangesNothing) {
         const char *log;
     } rows[] = {
         {"no zone", "", ENOENT, ""},
-        {"too long a path", string(4100, '/') + "UTC", ENAMETOOLONG, "3 open(*): File name too *"},
+        {"too long a path", string(4073, '/') + "UTC", ENAMETOOLONG, "3 open(*): File name too *"},
         {"a zone file of three bytes", "../../../run/z", EIO, "3 read(*/run/z): Input/output *"},
-        {"no zone file", "zone.tab", ENOENT, "3 *zoneinfo/zone.tab: is not tzfile\n"},
-        {"a zone that a shell would run", "../../../run/$(x)/../../usr/share/zoneinfo/UTC", EINVAL,
-         "3 open(*zoneinfo/UTC): Invalid *"},
+        {"a file that is no zone", "../../../run/n", ENOENT, "3 */run/n: is not tzfile\n"},
+        {"a zone that a shell would run", "a`b", EINVAL, "3 open(*zoneinfo/a`b): Invalid *"},
     };
-    run("echo TZ >/run/z; mkdir '/run/$(x)'");
+    run("echo TZ >/run/z; echo no zone >/run/n");
     const Files before = unit_files();
     for (const auto &row : rows) {
         EXPECT_EQ(vlsys_set_timezone(row.zone.c_str()), -row.error) << row.why;
@@ -64,4 +59,6 @@ TEST_F(Timezone, AFailureChangesNothing) {
         EXPECT_EQ(changes(before), "") << row.why;
         EXPECT_EQ(getenv("TZ"), nullptr) << row.why;
     }
+    for (const char *zone : {"a$b", "a\\b", "a\nb", "a\"b"})
+        EXPECT_EQ(vlsys_set_timezone(zone), -EINVAL) << zone;
 }
