@@ -186,6 +186,8 @@ static void make_networks() {
 
 void enter_namespaces() {
     setenv("PATH", UNIT_PROGRAMS ":/usr/sbin:/usr/bin:/sbin:/bin", 1);
+    for (const char *name : {"TZ", "VL_ROOT", "VL_PREFIX", "VL_DATA"})
+        unsetenv(name);
     become_root();
     fork_and_wait(); // into the PID namespace, as its init
     fork_and_wait(); // an init ignores the signals that end any other process
@@ -207,6 +209,9 @@ static void copy_files() {
         } else {
             fs::remove(target, error);
             fs::copy_file(entry.path(), target, error);
+            // Not those of the clone, which depend on its maker's umask.
+            const bool is_program = access(entry.path().c_str(), X_OK) == 0;
+            fs::permissions(target, fs::perms{is_program ? 0755U : 0644U}, error);
         }
         check(error, target);
     }
@@ -243,7 +248,7 @@ void set_interfaces(const std::vector<std::string> &names) {
     struct if_nameindex *const present = if_nameindex();
     for (const struct if_nameindex *entry = present; entry->if_name; ++entry)
         if (missing.erase(entry->if_name) == 0 && strcmp(entry->if_name, "lo") != 0)
-            run(std::string("ip link del ") + entry->if_name);
+            run(std::string("ip link del '") + entry->if_name + "'");
     if_freenameindex(present);
     for (const std::string &name : names)
         if (missing.contains(name))
