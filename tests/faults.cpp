@@ -45,9 +45,10 @@ static const Calls calls[] = {
     {"connect", -1, unchanged, {ECONNREFUSED, ETIMEDOUT}, {EINTR}},
     {"fsync", -1, unchanged, {EIO, ENOSPC}, {EINVAL}},
     {"getxattr", -1, unchanged, {EIO}, {ENODATA, EOPNOTSUPP}},
+    {"readlink", -1, unchanged, {}, {EINVAL}},
     {"fsetxattr fchmod chmod sethostname", -1, unchanged, {EPERM}, {}},
     {"rename unlink fstat", -1, unchanged, {EIO, EACCES}, {}},
-    {"access", -1, unchanged, {}, {ENOENT, EACCES}},
+    {"access lstat", -1, unchanged, {}, {ENOENT, EACCES}},
     {"symlink", -1, unchanged, {ENOSPC, EEXIST}, {}},
     {"mkdir rmdir", -1, unchanged, {ENOSPC, EROFS}, {}},
     {"setenv gethostname", -1, unchanged, {ENOMEM}, {}},
@@ -78,8 +79,8 @@ static void lose_content(int descriptor) {
 static void cut_power() {
     for (const auto &path : replaced) {
         struct stat status = {};
-        if (lstat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode) &&
-            truncate(path.c_str(), flushed[status.st_ino]) != 0)
+        if (fstatat(AT_FDCWD, path.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+            S_ISREG(status.st_mode) && truncate(path.c_str(), flushed[status.st_ino]) != 0)
             abort();
     }
 }

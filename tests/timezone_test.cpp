@@ -47,10 +47,13 @@ TEST_F(Timezone, AFailureChangesNothing) {
         {"no zone", "", ENOENT, ""},
         {"too long a path", string(4073, '/') + "UTC", ENAMETOOLONG, "3 open(*): File name too *"},
         {"a zone file of three bytes", "../../../run/z", EIO, "3 read(*/run/z): Input/output *"},
+        {"a pipe", "../../../run/pipe", EIO, "3 read(*/run/pipe): Input/output *"},
+        {"the system's own link", "../../../etc/localtime", ELOOP, "3 open(*): Too many *"},
+        {"a link to localtime", "../../../run/localtime", ELOOP, "3 open(*): Too many *"},
         {"a file that is no zone", "../../../run/n", ENOENT, "3 */run/n: is not tzfile\n"},
         {"a zone that a shell would run", "a`b", EINVAL, "3 open(*zoneinfo/a`b): Invalid *"},
     };
-    run("echo TZ >/run/z; echo no zone >/run/n");
+    run("cd /run; echo TZ >z; echo no zone >n; mkfifo pipe; ln -s /etc/localtime localtime");
     const Files before = unit_files();
     for (const auto &row : rows) {
         EXPECT_EQ(vlsys_set_timezone(row.zone.c_str()), -row.error) << row.why;

@@ -9,11 +9,13 @@
 #include <cstring>
 #include <fcntl.h>
 #include <string_view>
+#include <sys/stat.h>
+#include <unistd.h>
 
 namespace vlsys {
 
 static int check_zone_file(const char *path) {
-    const Fd file(open(path, O_RDONLY | O_CLOEXEC));
+    const Fd file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK)); // a pipe must not hold the caller
     if (!file)
         return log_errno("open(%s)", path);
     static constexpr std::string_view magic = "TZif";
@@ -37,6 +39,23 @@ static bool has_shell_text(const char *zone) {
         zone++;
     zone += strcspn(zone, "\"$`\\\n");
     return *zone != '\0' && strcmp(zone, "\"") != 0;
+}
+
+// By name too: /etc/localtime may be a hard link to the zone file.
+static bool is_same_entry(const char *a, const char *b) {
+    struct stat status_a;
+    struct stat status_b;
+    return strcmp(basename(a), basename(b)) == 0 && lstat(a, &status_a) == 0 &&
+           lstat(b, &status_b) == 0 && status_a.st_dev == status_b.st_dev &&
+           status_a.st_ino == status_b.st_ino;
+}
+
+// Whether the zone is the system's link itself, or a link to it, as "localtime" is on some systems.
+static bool leads_back(const char *zone_file, const char *link) {
+    char target[VLSYS_PATH_SIZE];
+    const ssize_t length = readlink(zone_file, target, sizeof target - 1);
+    target[std::max<ssize_t>(length, 0)] = '\0';
+    return is_same_entry(zone_file, link) || is_same_entry(target, link);
 }
 
 // Makes a link beside the path and moves it there, so that the path always names something.
@@ -68,6 +87,10 @@ static int set_localtime(const char *zone) {
     if (result != 0)
         return result;
     const SystemPath path(localtime_path);
+    if (leads_back(zone_file, path.text)) {
+        errno = ELOOP;
+        return log_errno("open(%s)", zone_file);
+    }
     return replace_link(path.text, zone_file);
 }
 
