@@ -6,7 +6,6 @@
 #include <cstdlib>
 #include <memory>
 #include <netdb.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 namespace vlsys {
@@ -73,18 +72,6 @@ class Fd {
 
   private:
     int fd_;
-};
-
-// Sets the process umask and puts the old one back.
-class SavedUmask {
-  public:
-    explicit SavedUmask(mode_t mask) : old_(umask(mask)) {}
-    SavedUmask(const SavedUmask &) = delete;
-    SavedUmask &operator=(const SavedUmask &) = delete;
-    ~SavedUmask() { umask(old_); }
-
-  private:
-    mode_t old_;
 };
 
 } // namespace vlsys

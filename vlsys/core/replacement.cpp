@@ -7,6 +7,7 @@
 #include <climits>
 #include <cstring>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <sys/xattr.h>
 #include <utility>
 
@@ -24,10 +25,7 @@ int Replacement::create(const char *path, char separator) {
     Text name = format_text("%s%cXXXXXX", path, separator);
     if (!name)
         return log_errno("asprintf(\"%%s%cXXXXXX\", %s)", separator, path);
-    {
-        const SavedUmask mask(077);
-        fd_.reset(mkostemp(name.get(), O_CLOEXEC));
-    }
+    fd_.reset(mkostemp(name.get(), O_CLOEXEC)); // mode 0600, whatever the umask
     if (!fd_)
         return log_errno("mkstemp(%s)", name.get());
     temporary_ = std::move(name);
@@ -58,7 +56,9 @@ bool Replacement::flush() {
 bool Replacement::write_all(std::string_view bytes) const {
     while (!bytes.empty()) {
         const ssize_t length = TEMP_FAILURE_RETRY(::write(fd_.get(), bytes.data(), bytes.size()));
-        if (length < 0)
+        if (length == 0)
+            errno = EIO; // who takes nothing would be asked for ever
+        if (length <= 0)
             return false;
         bytes.remove_prefix(static_cast<size_t>(length));
     }

@@ -4,6 +4,7 @@
 #include "core/paths.h"
 
 #include <cstring>
+#include <sys/stat.h>
 
 namespace vlsys {
 

@@ -3,6 +3,7 @@
 
 #include <cstring>
 #include <fts.h>
+#include <sys/stat.h>
 
 namespace vlsys {
 
