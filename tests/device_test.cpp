@@ -88,6 +88,7 @@ TEST_F(Device, TheSerialNumberIsTakenFromTheListing) {
         {"no number", "MainSerialNumber :\n0\n", 5, "00000"},
         {"cut", "MainSerialNumber : 12345678901234567890\n0\n", 20, "123456789012345"},
         {"the tool failed", "MainSerialNumber : 5\n9\n256\n", VLSYS_SERIAL_COMMAND_FAILED - 1, "5"},
+        {"no wait status", "MainSerialNumber : 5\n-9999\n", VLSYS_SERIAL_COMMAND_FAILED, "5"},
         {"a signal ended the tool", "MainSerialNumber : 5\n \t139 256\n",
          VLSYS_SERIAL_COMMAND_FAILED - 139, "5"},
     };

@@ -83,6 +83,8 @@ int vlsys_get_serial_number(char *buffer, size_t size) {
 
     if (length < 0)
         return length;
+    if (status < 0)
+        return VLSYS_SERIAL_COMMAND_FAILED; // subtracted, it could pass for a length
     const int exit_code = (status >> 8) & 0xff;
     if ((status & 0x7f) != 0)
         return VLSYS_SERIAL_COMMAND_FAILED - status;
