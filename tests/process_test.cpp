@@ -54,6 +54,9 @@ TEST_F(Process, AReplyIsOneNumber) {
         EXPECT_EQ(vlsys_system("a b"), row.result) << row.why;
         EXPECT_EQ(errno, row.error) << row.why;
     }
+    const auto request = answer("");
+    EXPECT_EQ(vlsys_popen("a b"), nullptr);
+    EXPECT_EQ(errno, ECONNRESET);
 }
 
 TEST_F(Process, ACommandIsSentWithTheWorkingDirectory) {

@@ -260,6 +260,10 @@ FILE *vlsys_popen(const char *command) {
     Reply reply;
     if (ask(connection.get(), Kind::pipe_read, command, &reply) < 0)
         return nullptr;
+    if (reply.length == 0) { // an empty stream would pass for the command's output
+        errno = ECONNRESET;
+        return nullptr;
+    }
     log_process_id(&reply);
     if (send_text(connection.get(), "start\n", "start\n") < 0)
         return nullptr;
