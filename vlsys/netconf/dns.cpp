@@ -132,7 +132,8 @@ static int read_resolver(FILE *file, vlsys_dns *dns) {
             value = "";
         if (starts_with(keyword, "domain") || starts_with(keyword, "search"))
             vlsys_strlcpy(dns->domain, value, sizeof dns->domain);
-        else if (starts_with(keyword, "nameserver") && servers < VLSYS_DNS_COUNT)
+        else if (starts_with(keyword, "nameserver") && servers < VLSYS_DNS_COUNT &&
+                 strlen(value) < VLSYS_ADDR6_SIZE) // cut, it would be another server
             vlsys_strlcpy(dns->server[servers++], value, VLSYS_ADDR6_SIZE);
     }
     return result;
@@ -189,7 +190,7 @@ static int read_dns_mode(const InterfaceList &interfaces, uint32_t *mode) {
 
 static int get_dns(vlsys_dns *dns) {
     *dns = {};
-    const File file(fopen(resolv_path, "re"));
+    File file(fopen(resolv_path, "re"));
     if (!file)
         return errno == ENOENT ? 0 : log_errno("%s", resolv_path);
     const int result = read_resolver(file.get(), dns);
@@ -197,6 +198,7 @@ static int get_dns(vlsys_dns *dns) {
         *dns = {};
         return log_errno("fgets(%s)", resolv_path);
     }
+    file.reset(); // the list may need its descriptor
     const InterfaceList interfaces;
     return interfaces.count() == 0 ? 0 : read_dns_mode(interfaces, &dns->mode);
 }
