@@ -4,6 +4,7 @@
 #include "vlsys.h"
 
 #include <net/if.h>
+#include <netdb.h>
 
 using namespace test;
 using std::string;
@@ -63,6 +64,10 @@ TEST_F(Netstate, TheFirstIpv6DefaultRouteCounts) {
     EXPECT_STREQ(gateway.addr, "2001:db8:3:4:5:6:7:8");
     EXPECT_STREQ(gateway.iface, "eth1");
     EXPECT_EQ(gateway.mode, VLSYS_MODE_AUTO);
+    string long_name = any + any + "fe801111222233334444555566667777 0 1 0 3 eth100\n";
+    const vlsys::File other(fmemopen(long_name.data(), long_name.length(), "r"));
+    EXPECT_EQ(vlsys::read_ipv6_gateway(other.get(), &gateway), EAI_OVERFLOW);
+    EXPECT_STREQ(gateway.addr, "") << "cut, it would name eth10";
 }
 
 TEST_F(Netstate, TheIpv4GatewaysModeIsThatOfTheFiles) {

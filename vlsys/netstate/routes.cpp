@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <cstring>
 #include <net/route.h>
+#include <netdb.h>
 #include <string_view>
 
 namespace vlsys {
@@ -98,6 +99,12 @@ static in6_addr parse_next_hop(const char *word) {
     return address;
 }
 
+static int refuse_cut(vlsys_gw6 *gw) {
+    gw->addr[0] = '\0';
+    vlsys_log(LOG_ERR, "%s: getnameinfo: %s", "v6gateway", gai_strerror(EAI_OVERFLOW));
+    return EAI_OVERFLOW;
+}
+
 static int take_gateway(const Ipv6Route &route, vlsys_gw6 *gw) {
     sockaddr_in6 sa = {};
     sa.sin6_family = AF_INET6;
@@ -109,7 +116,8 @@ static int take_gateway(const Ipv6Route &route, vlsys_gw6 *gw) {
     if (route.device) {
         if (IN6_IS_ADDR_LINKLOCAL(&sa.sin6_addr)) {
             vlsys_strlcat(gw->addr, "%", sizeof gw->addr);
-            vlsys_strlcat(gw->addr, route.device, sizeof gw->addr);
+            if (vlsys_strlcat(gw->addr, route.device, sizeof gw->addr) >= sizeof gw->addr)
+                return refuse_cut(gw); // the beginning may name another interface
         }
         vlsys_strlcpy(gw->iface, route.device, sizeof gw->iface);
     }
