@@ -130,7 +130,7 @@ static bool is_unique_local(const in6_addr &address) {
 static bool has_plain_scope(const sockaddr_in6 &address) {
     char name[IF_NAMESIZE];
     if (!if_indextoname(address.sin6_scope_id, name))
-        return true; // the scope stays a number
+        return errno != ENXIO; // the number of no interface
     static constexpr char plain[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789"
                                     "._-@+";
     return name[strspn(name, plain)] == '\0';
@@ -147,6 +147,8 @@ int check_ipv6_text(struct sockaddr_in6 *out, char *text, int fieldcode) {
             return fieldcode | VLSYS_CHECK_KIND_INVALID;
     } else if (!is_global_unicast(address) && !is_unique_local(address)) {
         return fieldcode | VLSYS_CHECK_KIND_RANGE;
+    } else if (out->sin6_scope_id != 0) {
+        return fieldcode | VLSYS_CHECK_KIND_INVALID; // no script takes a scope there
     }
     return rewrite(field, out);
 }
