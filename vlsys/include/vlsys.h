@@ -6,7 +6,8 @@
  *
  * Threads: the library has no threads and no locks. Its process-wide state (paths, log, driver
  * status table) belongs to one thread, and so does every operation that is not said to run on any
- * thread. Setters change the umask of the whole process for a moment.
+ * thread. Do not cancel a thread (pthread_cancel) in an operation: its locks and temporary files
+ * would stay. An operation needs up to 32 KiB of stack.
  *
  * Setters change configuration files only, unless they say otherwise. What they write takes effect
  * at the next network restart or boot. A setter waits until each file that it rewrites has reached
@@ -151,15 +152,16 @@ VLSYS_API void vlsys_log(int priority, const char *format, ...) VLSYS_PRINTF(2, 
 VLSYS_API void vlsys_vlog(int priority, const char *format, va_list arguments) VLSYS_PRINTF(2, 0);
 
 /*
- * Opens the log under an identity text. The text is not copied and must outlive the log. Option and
- * facility are those of openlog. A negative facility selects standard-output mode, for the rest of
- * the process's life.
+ * Opens the log under an identity text, which must not be null. The text is not copied and must
+ * outlive the log. Option and facility are those of openlog. A negative facility selects
+ * standard-output mode, for the rest of the process's life.
  */
 VLSYS_API void vlsys_openlog(const char *ident, int option, int facility);
 
 /*
  * Closes the system log. The next message opens it again, under the program's short name. In
- * standard-output mode it does nothing.
+ * standard-output mode it does nothing. A program that closes descriptors which it did not open
+ * calls this first: else the next file or connection gets the log's number, and the messages.
  */
 VLSYS_API void vlsys_closelog(void);
 
@@ -174,7 +176,8 @@ VLSYS_API int vlsys_setlogmask(int mask);
 
 /*
  * Sets the time zone of the system, then of the calling process. The zone is a path below
- * /usr/share/zoneinfo/, such as "Asia/Shanghai". The steps:
+ * /usr/share/zoneinfo/, such as "Asia/Shanghai". It must not begin with a slash (TZ would then name
+ * another file). The steps:
  * - Check that the zone file is a compiled one.
  * - Make /etc/localtime a symbolic link to it, by way of "localtime.new" beside it.
  * - Rewrite the clock file, which must exist, by way of a temporary beside it. Every line that has
@@ -193,6 +196,7 @@ VLSYS_API int vlsys_setlogmask(int mask);
  *   -EFAULT  null zone;
  *   -ENOENT  empty zone (silent), no clock file, no zone file, or one without "TZif" at its start;
  *   -ENAMETOOLONG  the zone file's path is over 4095 bytes;
+ *   -ELOOP  the zone is a link to /etc/localtime, or is that file;
  *   -EINVAL  a shell that reads the clock file could run the zone: it has a "$", a backquote, a
  *   backslash, a line feed, or a double quote other than its first and last character;
  *   -EIO  zone file of fewer than 4 bytes;
@@ -217,7 +221,8 @@ VLSYS_API size_t vlsys_get_timezone(char *buffer, size_t size);
 
 /*
  * Writes the present offset of local time from UTC, such as "+0800", into a buffer of 6 bytes or
- * more. May run on any thread.
+ * more. The zone is the one that the process knows: one that another process has set since counts
+ * after tzset alone. May run on any thread.
  * Returns its length, 5; 0 when the buffer is null or too small (its content is then unspecified),
  * or when the local time is not known (logged).
  */
@@ -232,8 +237,10 @@ VLSYS_API size_t vlsys_get_utc_offset(char *buffer, size_t size);
  * read (see "Validation of a network setting"), or use vlsys_set_network.
  *
  * Where a file has a key more than once, a setter changes the first line and the others stay; in a
- * shell the last one wins. The name of /etc/sysctl.d/velmora does not end in ".conf": scripts that
- * take every file of the directory read it, others do not.
+ * shell the last one wins. A reader stops at a line without a key, such as "=" or one that begins
+ * with a NUL; a setter keeps that line and may write behind it, where no reader looks. The name of
+ * /etc/sysctl.d/velmora does not end in ".conf": scripts that take every file of the directory read
+ * it, others do not.
  *
  * An interface exists when the kernel has one of that very name; an alternative name does not
  * count. In a sysctl key, a dot in the interface's name is written "/".
@@ -630,6 +637,9 @@ VLSYS_API int vlsys_exit_status_text(char *buffer, size_t size, pid_t pid, const
  *   EINVAL, since each is one line of the request. In both cases nothing is sent or run. A command
  *   that is run directly may have line feeds.
  * - A request that could only be sent in part is not run.
+ * - What ends in " &" or " |" is a request of another kind to the surrogate parent: vlsys_system of
+ *   "daemon &" returns a process id in place of a wait status, and of "true |" runs nothing. Use
+ *   vlsys_spawn and vlsys_popen.
  * - The answer is what the first receive gives, at most 8191 bytes. It is taken as the truth.
  * - A command that is run directly is a child of the caller. When SIGCHLD is ignored, or a handler
  *   of the caller reaps every child, its end is not known: vlsys_system and vlsys_pclose then
@@ -662,9 +672,10 @@ VLSYS_API int vlsys_surrogate_connect(int quiet, const char *service);
  * Returns the command's wait status (exit code in bits 8 to 15, see vlsys_exit_status_text),
  * clamped to the range of int; -1 with errno set on failure:
  *   ECONNRESET  the surrogate parent closed the connection without an answer;
- *   EPROTO  its answer is not a number followed by a line feed or the end, or is a negative number;
+ *   EPROTO  its answer is not a number followed by a line feed or the end, or is a negative number,
+ *      which is then the result, so test for a result below 0;
  *   EFAULT, EINVAL  see the rules above;
- *   other errno  of the call that failed (logged).
+ *   other errno  of the call that failed (logged, but for system() itself).
  * Logs the exit code at LOG_DEBUG, when connected.
  */
 VLSYS_API int vlsys_system(const char *command);
@@ -682,8 +693,9 @@ VLSYS_API int vlsys_spawn(const char *command);
  * Runs a shell command and gives a stream to read its output from. Directly: popen(command, "re").
  * From the surrogate parent, the last line of the stream is the command's wait status in decimal.
  * Close the stream, which is close-on-exec, with vlsys_pclose.
- * Returns null with errno set on failure. E2BIG: working directory and command together have over
- * 1019 bytes. ERANGE: the directory alone has over 1023. Nothing is run then.
+ * Returns null with errno set on failure (that of popen is silent). ECONNRESET: the surrogate
+ * parent closed the connection without an answer. E2BIG: working directory and command together
+ * have over 1019 bytes. ERANGE: the directory alone has over 1023. Nothing is run then.
  * Logs the command's process id at LOG_INFO, when connected.
  * Reading the stream blocks, without a limit, until the command writes or ends.
  */
@@ -810,6 +822,7 @@ VLSYS_API int vlsys_get_hdcp_capability(void);
  *   the negated errno when the command could not be started, or its output not read;
  *   VLSYS_SERIAL_COMMAND_FAILED minus the wait status when a signal ended the command;
  *   VLSYS_SERIAL_COMMAND_FAILED minus the exit code when that is not 0;
+ *   VLSYS_SERIAL_COMMAND_FAILED when the last line begins with a negative number;
  *   VLSYS_SERIAL_DIRECT_FAILED minus the wait status that vlsys_pclose gives, when that is not 0
  *   (only when the command ran without the surrogate parent);
  *   VLSYS_SERIAL_PCLOSE_FAILED when it gives none.
@@ -907,11 +920,12 @@ VLSYS_API void vlsys_get_version(char *buffer, size_t size, time_t *time);
  *
  * A text of a record that fills its field may lack the NUL. gw4 is a buffer of VLSYS_ADDR4_SIZE,
  * gw6 one of VLSYS_ADDR6_SIZE bytes, empty for no gateway; hostname is one of at least 64 bytes.
- * "Canonical" is the text that getnameinfo gives for an address. The checks, in this order:
+ * "Canonical" is the text that getnameinfo gives for an address: "10.53" becomes 10.0.0.53, and
+ * "10.0.0.010", with a number in octal, 10.0.0.8. The checks, in this order:
  * - The interface exists.
  * - Every IPv4 address: not 0.0.0.0, not in 127.0.0.0/8, and below 224.0.0.0. Every IPv6 address:
- *   in 2000::/3, in fc00::/7, or link-local with its "%interface", whose name has letters, digits
- *   and "._-@+" alone.
+ *   in 2000::/3 or fc00::/7 without a "%", or link-local with its "%interface", whose name has
+ *   letters, digits and "._-@+" alone.
  * - IPv4 Manual: addr, netmask and the gateway become canonical, broadaddr is filled. A netmask
  *   that begins with a number from 8 to 30 is a prefix length and becomes a mask: "24", "24abc" and
  *   "24.0.0.0" are all 255.255.255.0. ("31" is the mask 0.0.0.31, which has a gap.) The gateway
@@ -1062,8 +1076,8 @@ VLSYS_API int vlsys_mkdir(const char *path, unsigned int mode);
 
 /*
  * Removes a file, or a directory with all that is in it. Symbolic links are removed, not followed.
- * Other file systems mounted below are not entered. Slashes at the path's end are ignored. The
- * names of a directory are held in memory.
+ * Other file systems mounted below are not entered, but a part of the same one is (bind mount).
+ * Slashes at the path's end are ignored. The names of a directory are held in memory.
  * - A directory that cannot be read is passed over silently. Removing its parent then fails; when
  *   it is the path itself, it stays and the result is 0.
  * - Any other entry that cannot be walked is passed over and logged at LOG_ERR (a directory cycle
