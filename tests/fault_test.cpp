@@ -73,8 +73,7 @@ bool may_be_left(const std::string &path, Fault fault) {
     return fault == Fault::failure ? path == "localtime.new" : is_temporary(path);
 }
 
-// Messages name the call, or the one that the log has always named in its place, or what it was
-// for.
+// Messages name the call, another that the log has always named in its place, or what it was for.
 bool is_named(const std::string &log, const std::string &call) {
     const auto names = {call.c_str(),   "printf(",
                         "mkstemp(",     "getline(",

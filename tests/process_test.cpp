@@ -87,6 +87,8 @@ TEST_F(Process, APipeReadIsStartedReadAndKilled) {
 
 TEST_F(Process, WhatIsNoRequestIsNotSent) {
     EXPECT_EQ(vlsys_system(nullptr), -1);
+    EXPECT_EQ(vlsys_popen(nullptr), nullptr);
+    EXPECT_EQ(vlsys_spawn_direct(nullptr), -1);
     auto request = answer("0\n");
     EXPECT_EQ(vlsys_system("a\nb"), -1);
     EXPECT_EQ(errno, EINVAL);
