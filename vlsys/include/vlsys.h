@@ -382,8 +382,8 @@ VLSYS_API int vlsys_set_dns_settings(const vlsys_dns *dns);
 /*
  * Reads the name resolution into the record, which must not be null.
  * - `domain` and up to three servers are those of /etc/resolv.conf. Of several "domain" and
- *   "search" lines the last counts, of several domains in it the first. A line of blanks alone ends
- *   the reading.
+ *   "search" lines the last counts, of several domains in it the first. A server that does not fit
+ *   its field is passed over: cut, it would be another. A line of blanks alone ends the reading.
  * - The mode is that of the interfaces' files: Manual when one has DOMAIN, else Off when all have
  *   PEERDNS=no, else DHCP. Without an interface it is Off.
  * - `iface` is left empty. Without /etc/resolv.conf the whole record is zero (Off).
